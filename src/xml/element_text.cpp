@@ -1,0 +1,56 @@
+// The element-text operations of CXMLDocument, shared by both parsers.
+#include <cstring>
+#include <new>
+
+#include "ka/result_codes.h"
+#include "xml/text_helpers.h"
+#include "xml/xml_document.h"
+
+namespace {
+
+constexpr char kCDataOpen[] = "![CDATA[";
+constexpr size_t kCDataOpenLength = sizeof(kCDataOpen) - 1;
+
+bool IsCDataSection(const char* text) { return strncmp(text, kCDataOpen, kCDataOpenLength) == 0; }
+
+}  // namespace
+
+void CXMLDocument::GetElementText(void* node, char*& field) {
+    char* text = nullptr;
+    int length = 0;
+    GetTagValue(node, &text, length);
+    if (text == nullptr) return;
+    const bool isCData = IsCDataSection(text);
+    if (!isCData && length == 0) return;
+
+    delete[] field;
+    field = nullptr;
+
+    // The module's strings are NUL-terminated; its length is not trusted for the copy.
+    const size_t size = strlen(text);
+    char* copy = new (std::nothrow) char[size + 1];
+    if (copy == nullptr) return;
+    memcpy(copy, text, size + 1);
+    field = copy;
+
+    if (isCData) {
+        // The content is never longer than the raw section, so it fits over it. Text inside a
+        // CDATA section is kept as written: no "&amp;" decoding.
+        char* scratch = new (std::nothrow) char[size + 1];
+        if (scratch == nullptr) return;
+        if (parse_cdata(scratch, field, static_cast<int>(size + 1)) == KA_OK) {
+            memcpy(field, scratch, strlen(scratch) + 1);
+        }
+        delete[] scratch;
+        return;
+    }
+    unescape_amp(field);
+}
+
+unsigned int CXMLDocument::IsElementCData(void* node, char** text, int& length) {
+    length = 0;
+    if (text == nullptr) return KA_ERR_LOAD_FAILED;
+    *text = nullptr;
+    GetTagValue(node, text, length);
+    return *text != nullptr && IsCDataSection(*text) ? KA_OK : KA_ERR_LOAD_FAILED;
+}

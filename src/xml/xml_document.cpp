@@ -1,0 +1,104 @@
+#include "xml/xml_document.h"
+
+#include <cstring>
+
+#include "ka/result_codes.h"
+#include "platform/bounded_string.h"
+
+namespace {
+
+constexpr char kModuleName[] = "kaXMLParser";
+constexpr char kModuleExtension[] = ".so";
+constexpr char kEntryName[] = "kaXMLGetParserAPI";
+
+}  // namespace
+
+CXMLDocument::CXMLDocument() : mXMLHandle(nullptr) { memset(&mXMLAPI, 0, sizeof(mXMLAPI)); }
+
+CXMLDocument::~CXMLDocument() { UninitXMLParser(); }
+
+unsigned int CXMLDocument::InitXMLParser() {
+    // A second Init first undoes the first one.
+    UninitXMLParser();
+
+    ka::CopyBounded(mLibName, sizeof(mLibName), kModuleName);
+    ka::AppendBounded(mLibName, sizeof(mLibName), kModuleExtension);
+    ka::CopyBounded(mEntryName, sizeof(mEntryName), kEntryName);
+
+    if (LoadLib(nullptr) == 0 || mEntry == nullptr) return KA_ERR_MODULE_NOT_LOADED;
+    mEntry(&mXMLAPI);
+    if (mXMLAPI.Init == nullptr) return KA_ERR_MODULE_NOT_LOADED;
+
+    XMLInitData init = {nullptr, nullptr, this};
+    return mXMLAPI.Init(&mXMLHandle, &init);
+}
+
+unsigned int CXMLDocument::UninitXMLParser() {
+    if (mXMLAPI.Uninit != nullptr) {
+        mXMLAPI.Uninit(mXMLHandle);
+        mXMLHandle = nullptr;
+    }
+    memset(&mXMLAPI, 0, sizeof(mXMLAPI));
+    FreeLib();
+    return KA_OK;
+}
+
+// Forwarders. A module that left a slot empty answers like a missing module instead of crashing.
+unsigned int CXMLDocument::LoadXML(char* buffer, int size, int mode) {
+    if (mXMLHandle == nullptr || mXMLAPI.LoadXML == nullptr) return KA_ERR_MODULE_NOT_LOADED;
+    return mXMLAPI.LoadXML(mXMLHandle, buffer, size, mode);
+}
+
+unsigned int CXMLDocument::GetFirstChild(void* node, void** child) {
+    if (mXMLHandle == nullptr || mXMLAPI.GetFirstChild == nullptr) return KA_ERR_MODULE_NOT_LOADED;
+    return mXMLAPI.GetFirstChild(mXMLHandle, node, child);
+}
+
+unsigned int CXMLDocument::GetNextSibling(void* node, void** sibling) {
+    if (mXMLHandle == nullptr || mXMLAPI.GetNextSibling == nullptr) return KA_ERR_MODULE_NOT_LOADED;
+    return mXMLAPI.GetNextSibling(mXMLHandle, node, sibling);
+}
+
+unsigned int CXMLDocument::GetChildByName(void* node, char* name, void** child) {
+    if (mXMLHandle == nullptr || mXMLAPI.GetChildByName == nullptr) return KA_ERR_MODULE_NOT_LOADED;
+    return mXMLAPI.GetChildByName(mXMLHandle, node, name, child);
+}
+
+unsigned int CXMLDocument::GetAttributeValue(void* node, char* name, char** value, int& length) {
+    if (mXMLHandle == nullptr || mXMLAPI.GetAttributeValue == nullptr)
+        return KA_ERR_MODULE_NOT_LOADED;
+    return mXMLAPI.GetAttributeValue(mXMLHandle, node, name, value, &length);
+}
+
+unsigned int CXMLDocument::GetNextAttribute(void* node, void** next, void* current, char** name,
+                                            int& nameLength, char** value, int& valueLength) {
+    if (mXMLHandle == nullptr || mXMLAPI.GetNextAttribute == nullptr)
+        return KA_ERR_MODULE_NOT_LOADED;
+    return mXMLAPI.GetNextAttribute(mXMLHandle, node, next, current, name, &nameLength, value,
+                                    &valueLength);
+}
+
+unsigned int CXMLDocument::GetTagValue(void* node, char** text, int& length) {
+    if (mXMLHandle == nullptr || mXMLAPI.GetTagValue == nullptr) return KA_ERR_MODULE_NOT_LOADED;
+    return mXMLAPI.GetTagValue(mXMLHandle, node, text, &length);
+}
+
+unsigned int CXMLDocument::GetTagName(void* node, char** name, int& length) {
+    if (mXMLHandle == nullptr || mXMLAPI.GetTagName == nullptr) return KA_ERR_MODULE_NOT_LOADED;
+    return mXMLAPI.GetTagName(mXMLHandle, node, name, &length);
+}
+
+unsigned int CXMLDocument::SetParam(unsigned int id, void* value) {
+    if (mXMLHandle == nullptr || mXMLAPI.SetParam == nullptr) return KA_ERR_MODULE_NOT_LOADED;
+    return mXMLAPI.SetParam(mXMLHandle, id, value);
+}
+
+unsigned int CXMLDocument::GetParam(unsigned int id, void* value) {
+    if (mXMLHandle == nullptr || mXMLAPI.GetParam == nullptr) return KA_ERR_MODULE_NOT_LOADED;
+    return mXMLAPI.GetParam(mXMLHandle, id, value);
+}
+
+unsigned int CXMLDocument::Reserved12(char* text, void* node, int& a, int& b) {
+    if (mXMLHandle == nullptr || mXMLAPI.Reserved12 == nullptr) return KA_ERR_MODULE_NOT_LOADED;
+    return mXMLAPI.Reserved12(mXMLHandle, text, node, &a, &b);
+}
