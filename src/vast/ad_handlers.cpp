@@ -1,0 +1,146 @@
+// Handlers of the document, <Ad>, <InLine> and <Wrapper> levels.
+#include <cstdlib>
+
+#include "ka/result_codes.h"
+#include "ka/vast_extension.h"
+#include "vast/vast_parser.h"
+#include "vast/vast_text.h"
+#include "xml/text_helpers.h"
+
+using ka::NameIs;
+
+unsigned int CVASTParser::LoadVASTTag(void* node, void* target, char* name,
+                                      unsigned int nameLength) {
+    if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
+    VastAdData* data = static_cast<VastAdData*>(target);
+    if (NameIs(name, nameLength, "Ad")) {
+        AdData* ad = new AdData();
+        mAdTail.Append(&data->firstAd, ad);
+        data->adCount++;
+        LoadAdAttributes(node, ad);
+        LoadTag(node, ad, &CVASTParser::LoadAdTag);
+    } else if (NameIs(name, nameLength, "Error")) {
+        GetElementText(node, data->errorUrl);
+    }
+    return KA_OK;
+}
+
+unsigned int CVASTParser::LoadAdAttributes(void* node, AdData* ad) {
+    if (node == nullptr || ad == nullptr) return KA_OK;
+    ka::CopyAttribute(*this, node, "id", ad->id);
+    char* value = nullptr;
+    int length = 0;
+    if (ka::ReadAttribute(*this, node, "sequence", &value, length)) ad->sequence = atoi(value);
+    return KA_OK;
+}
+
+unsigned int CVASTParser::LoadAdTag(void* node, void* target, char* name, unsigned int nameLength) {
+    if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
+    AdData* ad = static_cast<AdData*>(target);
+    // The first <InLine> or <Wrapper> decides the ad; later ones are ignored entirely.
+    if (ad->body != nullptr) return KA_OK;
+    if (NameIs(name, nameLength, "InLine")) {
+        ad->type = AD_TYPE_INLINE;
+        AdInLine* inLine = new AdInLine();
+        ad->body = inLine;
+        LoadTag(node, inLine, &CVASTParser::LoadInLineTag);
+    } else if (NameIs(name, nameLength, "Wrapper")) {
+        ad->type = AD_TYPE_WRAPPER;
+        ad->body = new AdWrapper();
+        LoadTag(node, ad, &CVASTParser::LoadWrapperTag);
+    } else {
+        // Any other child before the body marks the ad as InLine, still without a body.
+        ad->type = AD_TYPE_INLINE;
+    }
+    return KA_OK;
+}
+
+namespace {
+
+// Element text of an <Impression> appended to list; empty texts add no node.
+void AppendImpression(CXMLDocument& doc, void* node, AdImpression** list,
+                      ka::ListTail<AdImpression>& tail) {
+    char* url = nullptr;
+    doc.GetElementText(node, url);
+    if (url == nullptr) return;
+    if (url[0] == '\0') {
+        delete[] url;
+        return;
+    }
+    AdImpression* impression = new AdImpression();
+    impression->url = url;
+    tail.Append(list, impression);
+}
+
+}  // namespace
+
+unsigned int CVASTParser::LoadInLineTag(void* node, void* target, char* name,
+                                        unsigned int nameLength) {
+    if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
+    AdInLine* inLine = static_cast<AdInLine*>(target);
+    if (NameIs(name, nameLength, "AdSystem")) {
+        ka::ReadRawText(*this, node, inLine->adSystem);
+    } else if (NameIs(name, nameLength, "AdTitle")) {
+        ka::ReadRawText(*this, node, inLine->adTitle);
+    } else if (NameIs(name, nameLength, "Impression")) {
+        // Counted even when empty: the count says how many elements the ad had.
+        inLine->impressionCount++;
+        AppendImpression(*this, node, &inLine->impressions, mImpressionTail);
+    } else if (NameIs(name, nameLength, "Description")) {
+        ka::ReadRawText(*this, node, inLine->description);
+    } else if (NameIs(name, nameLength, "Advertiser")) {
+        ka::ReadRawText(*this, node, inLine->advertiser);
+    } else if (NameIs(name, nameLength, "Survey")) {
+        // Survey URLs carry query strings: the one raw text that gets "&amp;" decoded.
+        if (ka::ReadRawText(*this, node, inLine->survey)) unescape_amp(inLine->survey);
+    } else if (NameIs(name, nameLength, "Error")) {
+        GetElementText(node, inLine->error);
+    } else if (NameIs(name, nameLength, "Creatives")) {
+        LoadTag(node, inLine, &CVASTParser::LoadCreativesTag);
+    } else if (NameIs(name, nameLength, "Extensions")) {
+        return LoadExtensions(node, inLine->extensions);
+    }
+    return KA_OK;
+}
+
+unsigned int CVASTParser::LoadCreativesTag(void* node, void* target, char* name,
+                                           unsigned int nameLength) {
+    if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
+    AdInLine* inLine = static_cast<AdInLine*>(target);
+    if (LoadCreative(node, &inLine->creatives, name, nameLength) == KA_OK) {
+        inLine->creativeCount++;
+    }
+    return KA_OK;
+}
+
+unsigned int CVASTParser::LoadWrapperTag(void* node, void* target, char* name,
+                                         unsigned int nameLength) {
+    if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
+    AdWrapper* wrapper = static_cast<AdWrapper*>(static_cast<AdData*>(target)->body);
+    if (wrapper == nullptr) return KA_OK;
+    if (NameIs(name, nameLength, "AdSystem")) {
+        ka::ReadRawText(*this, node, wrapper->adSystem);
+    } else if (NameIs(name, nameLength, "VASTAdTagURI")) {
+        GetElementText(node, wrapper->vastAdTagUri);
+    } else if (NameIs(name, nameLength, "Error")) {
+        GetElementText(node, wrapper->error);
+    } else if (NameIs(name, nameLength, "Impression")) {
+        AppendImpression(*this, node, &wrapper->impressions, mImpressionTail);
+    } else if (NameIs(name, nameLength, "Creatives")) {
+        LoadTag(node, &wrapper->creatives, &CVASTParser::LoadCreative);
+    } else if (NameIs(name, nameLength, "Extensions")) {
+        return LoadExtensions(node, wrapper->extensions);
+    }
+    return KA_OK;
+}
+
+unsigned int CVASTParser::LoadExtensions(void* node, CAdExtensions*& extensions) {
+    if (mExtensionParser == nullptr) return KA_OK;
+    unsigned int result = mExtensionParser->Parse(node);
+    if (result != KA_OK) return result;
+    CAdExtensions* built = mExtensionParser->GetResult();
+    // A second <Extensions> replaces the first; the ad owns only one object.
+    if (extensions != nullptr && extensions != built) delete extensions;
+    extensions = built;
+    return KA_OK;
+}

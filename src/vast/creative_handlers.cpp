@@ -1,0 +1,50 @@
+// Handlers of <Creatives> and <Creative>: one AdCreative per Creative element.
+#include <cstdlib>
+
+#include "ka/result_codes.h"
+#include "vast/vast_parser.h"
+#include "vast/vast_text.h"
+
+using ka::NameIs;
+
+unsigned int CVASTParser::LoadCreative(void* node, void* target, char* name,
+                                       unsigned int nameLength) {
+    // The error keeps other children out of the InLine's creativeCount.
+    if (node == nullptr || target == nullptr || name == nullptr) return KA_ERR_LOAD_FAILED;
+    if (!NameIs(name, nameLength, "Creative")) return KA_ERR_LOAD_FAILED;
+    AdCreative* creative = new AdCreative();
+    mCreativeTail.Append(static_cast<AdCreative**>(target), creative);
+    LoadCreativeAttributes(node, creative);
+    LoadTag(node, creative, &CVASTParser::LoadCreativeTag);
+    return KA_OK;
+}
+
+unsigned int CVASTParser::LoadCreativeAttributes(void* node, AdCreative* creative) {
+    if (node == nullptr || creative == nullptr) return KA_OK;
+    ka::CopyAttribute(*this, node, "id", creative->id);
+    char* value = nullptr;
+    int length = 0;
+    if (ka::ReadAttribute(*this, node, "sequence", &value, length)) {
+        creative->sequence = atoi(value);
+    }
+    ka::CopyAttribute(*this, node, "adId", creative->adId);
+    return KA_OK;
+}
+
+unsigned int CVASTParser::LoadCreativeTag(void* node, void* target, char* name,
+                                          unsigned int nameLength) {
+    if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
+    // Only linear content is kept; non-linear and companion content is skipped.
+    if (!NameIs(name, nameLength, "Linear")) return KA_OK;
+    AdCreative* creative = static_cast<AdCreative*>(target);
+    creative->kind = AD_CREATIVE_LINEAR;
+    LoadTag(node, &creative->content, &CVASTParser::LoadLinearTag);
+    // After the children, so that a percentage can use the duration.
+    LoadSkipOffset(node, &creative->content);
+    return KA_OK;
+}
+
+unsigned int CVASTParser::LoadIgnoredTag(void* /*node*/, void* /*target*/, char* /*name*/,
+                                         unsigned int /*nameLength*/) {
+    return KA_OK;
+}

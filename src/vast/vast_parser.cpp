@@ -1,0 +1,111 @@
+#include "vast/vast_parser.h"
+
+#include <climits>
+
+#include "ka/result_codes.h"
+#include "ka/vast_extension.h"
+#include "platform/limits.h"
+
+CVASTParser::CVASTParser()
+    : mVastAdData(),
+      mMaxDepth(ka::kMaxWrapperDepth),
+      mExtensionParser(nullptr),
+      mMergeWrappers(1),
+      mStopFlag(nullptr) {}
+
+CVASTParser::~CVASTParser() { CVASTParser::Close(); }
+
+unsigned int CVASTParser::Open(char* workingPath) {
+    SetWorkPath(workingPath);
+    return InitXMLParser();
+}
+
+unsigned int CVASTParser::Close() {
+    unsigned int result = UninitXMLParser();
+    if (result == 0 && mExtensionParser != nullptr) {
+        delete mExtensionParser;
+        mExtensionParser = nullptr;
+    }
+    return result;
+}
+
+unsigned int CVASTParser::Process(void* buffer, unsigned int size, KA_BOOL mergeWrappers,
+                                  KA_BOOL* stopFlag) {
+    mMergeWrappers = mergeWrappers;
+    mStopFlag = stopFlag;
+    // The module takes the size as an int: a larger buffer cannot be loaded.
+    if (buffer == nullptr || size > static_cast<unsigned int>(INT_MAX)) return KA_ERR_LOAD_FAILED;
+    if (LoadXML(static_cast<char*>(buffer), static_cast<int>(size), ka::kXmlLoadMode) != 0) {
+        return KA_ERR_LOAD_FAILED;
+    }
+    void* root = nullptr;
+    GetFirstChild(nullptr, &root);
+    if (root == nullptr) return KA_ERR_LOAD_FAILED;
+    // Whatever the root is called, its children are read as those of <VAST>.
+    ParseVASTNode(root, true, mergeWrappers != 0);
+    return KA_OK;
+}
+
+unsigned int CVASTParser::SetParam(unsigned int id, void* value) {
+    if (id == KA_PID_VAST_EXTENSION_PARSER) {
+        mExtensionParser = static_cast<CExtensionParser*>(value);
+    }
+    return KA_OK;
+}
+
+unsigned int CVASTParser::GetParam(unsigned int /*id*/, void* /*value*/) { return KA_OK; }
+
+unsigned int CVASTParser::ParseVASTNode(void* node, bool ownsDocument, bool mergeWrappers) {
+    ResetTails();
+    LoadTag(node, &mVastAdData, &CVASTParser::LoadVASTTag);
+    ResetTails();
+    // The document and the module go before any wrapper is fetched: along a chain of wrappers
+    // only one fetched document is loaded at a time.
+    if (ownsDocument) Close();
+    WalkWrappers(mergeWrappers);
+    return KA_OK;
+}
+
+void CVASTParser::WalkWrappers(bool mergeWrappers) {
+    for (AdData* ad = mVastAdData.firstAd; ad != nullptr;) {
+        // The wrapper chain rewrites the node in place, so the next one is taken first.
+        AdData* next = ad->next;
+        if (ad->type == AD_TYPE_WRAPPER && ad->body != nullptr) {
+            if (mVastAdData.depth >= mMaxDepth) break;
+            // The wrapper chain hooks in here: the fetch of the wrapper's vastAdTagUri into a
+            // nested parser, then, when mergeWrappers is set, the merge of its result into ad.
+            (void)mergeWrappers;
+        }
+        ad = next;
+    }
+}
+
+unsigned int CVASTParser::LoadTag(void* node, void* target, TagHandler handler) {
+    if (node == nullptr || target == nullptr || handler == nullptr) return KA_OK;
+    void* child = nullptr;
+    GetFirstChild(node, &child);
+    while (child != nullptr) {
+        char* name = nullptr;
+        int length = 0;
+        GetTagName(child, &name, length);
+        if (name != nullptr && length >= 1) {
+            (this->*handler)(child, target, name, static_cast<unsigned int>(length));
+        }
+        // Written fresh each time: a lookup that fails without writing still ends the walk.
+        void* sibling = nullptr;
+        GetNextSibling(child, &sibling);
+        child = sibling;
+    }
+    return KA_OK;
+}
+
+void CVASTParser::ResetTails() {
+    mAdTail.Reset();
+    mImpressionTail.Reset();
+    mCreativeTail.Reset();
+    mMediaFileTail.Reset();
+    mTrackingTail.Reset();
+    mClickThroughTail.Reset();
+    mClickTrackingTail.Reset();
+    mCustomClickTail.Reset();
+}

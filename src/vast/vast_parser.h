@@ -1,0 +1,100 @@
+// CVASTParser reads one VAST document, or the VAST element of another parser's document, into
+// the VastAdData records of ka/vast_records.h. It walks the tree through the XML module it
+// loads as a CXMLDocument: LoadTag hands each child element to one member handler per parent
+// element, and the handlers fill the records.
+#pragma once
+
+#include "ka/types.h"
+#include "ka/vast_records.h"
+#include "vast/list_tail.h"
+#include "xml/xml_document.h"
+
+class CExtensionParser;
+
+class CVASTParser : public CXMLDocument {
+public:
+    // Handler of one child element: (child node, record being filled, tag name, name length).
+    typedef unsigned int (CVASTParser::*TagHandler)(void* node, void* target, char* name,
+                                                    unsigned int nameLength);
+
+    CVASTParser();
+    // Closes the parser; the records in mVastAdData belong to whoever holds them and stay.
+    ~CVASTParser() override;
+
+    // Virtual slots, after the eleven of CLibLoader, in this order.
+    // Stores the working path (kept by pointer) and loads the XML module: InitXMLParser's result.
+    virtual unsigned int Open(char* workingPath);
+    // Unloads the XML module and, when that worked, destroys the extension parser.
+    virtual unsigned int Close();
+    // Parses a whole VAST document; 0, or 0x91001000 when it cannot be loaded or has no root.
+    // Closes the parser when done: a second Process needs a new Open.
+    virtual unsigned int Process(void* buffer, unsigned int size, KA_BOOL mergeWrappers,
+                                 KA_BOOL* stopFlag);
+    // KA_PID_VAST_EXTENSION_PARSER installs a CExtensionParser* that this object then owns;
+    // other ids are ignored. Hides CXMLDocument's forwarder to the XML module on purpose.
+    virtual unsigned int SetParam(unsigned int id, void* value);
+    // Reports nothing; always 0.
+    virtual unsigned int GetParam(unsigned int id, void* value);
+    // Reads the children of a VAST element into mVastAdData, then walks its Wrapper ads.
+    virtual unsigned int ParseVASTNode(void* node, bool ownsDocument, bool mergeWrappers);
+
+    // Calls handler for every child element of node that has a non-empty name; always 0.
+    unsigned int LoadTag(void* node, void* target, TagHandler handler);
+
+    // Document, ad, InLine and Wrapper levels (ad_handlers.cpp).
+    unsigned int LoadVASTTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadAdAttributes(void* node, AdData* ad);
+    unsigned int LoadAdTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadInLineTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadCreativesTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadWrapperTag(void* node, void* target, char* name, unsigned int nameLength);
+
+    // Creative level (creative_handlers.cpp). LoadCreative's target is the head of a creative
+    // list (AdCreative**); it returns 0x91001000 for anything but a "Creative" element.
+    unsigned int LoadCreative(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadCreativeTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadCreativeAttributes(void* node, AdCreative* creative);
+    unsigned int LoadIgnoredTag(void* node, void* target, char* name, unsigned int nameLength);
+
+    // Linear level (linear_handlers.cpp).
+    unsigned int LoadLinearTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadMediaFilesTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadVideoClicksTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadTrackingEventsTag(void* node, void* target, char* name,
+                                       unsigned int nameLength);
+    unsigned int LoadSkipOffset(void* node, AdLinear* linear);
+    unsigned int LoadMediaFileAttributes(void* node, AdMediaFile* mediaFile);
+    unsigned int LoadTrackingAttributes(void* node, AdTracking* tracking);
+
+    // Releases (vast_release.cpp): free everything below the record, null what they freed,
+    // accept null and always return 0. They use no parser state.
+    unsigned int ReleaseVastAdData(VastAdData* data);
+    // Frees the ad's id and body; the node itself, its sequence, type and next stay.
+    unsigned int ReleaseAdData(AdData* ad);
+    // Frees the lists of a linear creative and zeroes it.
+    unsigned int ReleaseLinear(AdLinear* linear);
+
+    VastAdData mVastAdData;              // result of the documents parsed by this object
+    unsigned int mMaxDepth;              // a parser at this wrapper depth follows no wrapper
+    CExtensionParser* mExtensionParser;  // owned; null when none is installed
+    KA_BOOL mMergeWrappers;              // merge flag of the last Process, for nested parsers
+    KA_BOOL* mStopFlag;                  // stop flag of the last Process; null without one
+
+private:
+    // <Extensions> of an InLine or Wrapper into its extensions field: the Parse result.
+    unsigned int LoadExtensions(void* node, CAdExtensions*& extensions);
+    // Wrapper ads of mVastAdData, in list order, while this document is above the depth limit.
+    void WalkWrappers(bool mergeWrappers);
+    // Forgets the remembered list ends; called around every walk and by every release.
+    void ResetTails();
+
+    // Last nodes appended, one per kind of list being filled (list_tail.h).
+    ka::ListTail<AdData> mAdTail;
+    ka::ListTail<AdImpression> mImpressionTail;
+    ka::ListTail<AdCreative> mCreativeTail;
+    ka::ListTail<AdMediaFile> mMediaFileTail;
+    ka::ListTail<AdTracking> mTrackingTail;
+    ka::ListTail<AdClick> mClickThroughTail;
+    ka::ListTail<AdClick> mClickTrackingTail;
+    ka::ListTail<AdClick> mCustomClickTail;
+};

@@ -1,0 +1,154 @@
+// Shared by the VAST parser tests: a fixture that runs documents through a real CVASTParser
+// over the stand-in XML module, and walks over the records it builds.
+#pragma once
+
+#include <gtest/gtest.h>
+
+#include <cstdint>
+#include <cstring>
+#include <fstream>
+#include <sstream>
+#include <string>
+
+#include "ka/result_codes.h"
+#include "ka/vast_records.h"
+#include "platform/sdk_object.h"
+#include "vast/vast_parser.h"
+
+namespace vasttest {
+
+// Open takes the working path by pointer and keeps it: a buffer that lives for the whole run.
+inline char* ModulesDir() {
+    static char dir[1024];
+    if (dir[0] == '\0') std::strncpy(dir, KA_MODULES_DIR, sizeof(dir) - 1);
+    return dir;
+}
+
+inline std::string ReadFile(const std::string& path) {
+    std::ifstream in(path, std::ios::binary);
+    std::ostringstream out;
+    out << in.rdbuf();
+    return out.str();
+}
+
+inline std::string DataFile(const char* name) {
+    return ReadFile(std::string(KA_TEST_DATA_DIR) + "vast/" + name);
+}
+
+template <typename T>
+uint32_t Length(const T* list) {
+    uint32_t n = 0;
+    for (; list != nullptr; list = list->next) ++n;
+    return n;
+}
+
+template <typename T>
+T* Nth(T* list, uint32_t index) {
+    for (uint32_t i = 0; i < index && list != nullptr; ++i) list = list->next;
+    return list;
+}
+
+inline std::string Str(const char* text) { return text == nullptr ? "<null>" : text; }
+
+// Every count of the records equals the length of its list.
+inline void ExpectCountsMatch(const VastAdData& data) {
+    EXPECT_EQ(data.adCount, Length(data.firstAd));
+    for (const AdData* ad = data.firstAd; ad != nullptr; ad = ad->next) {
+        const AdCreative* creatives = nullptr;
+        if (ad->type == AD_TYPE_INLINE && ad->body != nullptr) {
+            const AdInLine* inLine = static_cast<const AdInLine*>(ad->body);
+            EXPECT_GE(inLine->impressionCount, Length(inLine->impressions));
+            EXPECT_EQ(inLine->creativeCount, Length(inLine->creatives));
+            creatives = inLine->creatives;
+        } else if (ad->type == AD_TYPE_WRAPPER && ad->body != nullptr) {
+            creatives = static_cast<const AdWrapper*>(ad->body)->creatives;
+        }
+        for (const AdCreative* c = creatives; c != nullptr; c = c->next) {
+            const AdLinear& l = c->content;
+            EXPECT_EQ(l.mediaFileCount, Length(l.mediaFiles));
+            EXPECT_EQ(l.trackingCount, Length(l.trackingEvents));
+            EXPECT_EQ(l.videoClicksCount, Length(l.videoClicks));
+            EXPECT_EQ(l.adParametersCount, Length(l.adParameters));
+            EXPECT_EQ(l.iconCount, Length(l.icons));
+            if (l.videoClicks != nullptr) {
+                EXPECT_EQ(l.videoClicks->clickThroughCount, Length(l.videoClicks->clickThroughs));
+                EXPECT_EQ(l.videoClicks->clickTrackingCount, Length(l.videoClicks->clickTrackings));
+                EXPECT_EQ(l.videoClicks->customClickCount, Length(l.videoClicks->customClicks));
+            }
+        }
+    }
+}
+
+class VastParserTest : public ::testing::Test {
+protected:
+    void SetUp() override {
+        mObjectsBefore = CSDKObject::g_kaSDKObjectNum;
+        mParser = new CVASTParser();
+        // The records exactly as read: at its depth limit a parser follows no wrapper, so the
+        // documents' made-up VASTAdTagURIs are never fetched.
+        mParser->mMaxDepth = 0;
+        ASSERT_EQ(mParser->Open(ModulesDir()), 0u) << "XML module not found in " << ModulesDir();
+    }
+
+    void TearDown() override {
+        if (mParser != nullptr) {
+            mParser->ReleaseVastAdData(&mParser->mVastAdData);
+            EXPECT_EQ(mParser->mVastAdData.firstAd, nullptr);
+            EXPECT_EQ(mParser->mVastAdData.errorUrl, nullptr);
+            delete mParser;
+        }
+        // Nested parsers and every other library object are gone with the records.
+        EXPECT_EQ(CSDKObject::g_kaSDKObjectNum, mObjectsBefore);
+    }
+
+    // Runs a whole document through Process; the counts are checked after every parse.
+    unsigned int Parse(const std::string& document) {
+        std::string buffer = document;
+        unsigned int result =
+            mParser->Process(&buffer[0], static_cast<unsigned int>(buffer.size()), 1, nullptr);
+        ExpectCountsMatch(mParser->mVastAdData);
+        return result;
+    }
+
+    // Opens again (Process closes the parser) and parses.
+    unsigned int Reparse(const std::string& document) {
+        EXPECT_EQ(mParser->Open(ModulesDir()), 0u);
+        return Parse(document);
+    }
+
+    VastAdData& Data() { return mParser->mVastAdData; }
+    AdData* Ad(uint32_t index) { return Nth(Data().firstAd, index); }
+    AdInLine* InLine(uint32_t index) {
+        AdData* ad = Ad(index);
+        if (ad == nullptr || ad->type != AD_TYPE_INLINE) return nullptr;
+        return static_cast<AdInLine*>(ad->body);
+    }
+    AdWrapper* Wrapper(uint32_t index) {
+        AdData* ad = Ad(index);
+        if (ad == nullptr || ad->type != AD_TYPE_WRAPPER) return nullptr;
+        return static_cast<AdWrapper*>(ad->body);
+    }
+    // The first creative of the first InLine ad of a document.
+    AdCreative* FirstCreative() {
+        AdInLine* inLine = InLine(0);
+        return inLine == nullptr ? nullptr : inLine->creatives;
+    }
+
+    CVASTParser* mParser = nullptr;
+    int mObjectsBefore = 0;
+};
+
+// A VAST document with one InLine ad whose InLine holds the given content.
+inline std::string InLineDocument(const std::string& inLineContent) {
+    return "<VAST version=\"3.0\"><Ad id=\"a\"><InLine>" + inLineContent + "</InLine></Ad></VAST>";
+}
+
+// A VAST document with one InLine ad holding one Creative whose Linear has the given
+// attributes and content.
+inline std::string LinearDocument(const std::string& linearAttributes,
+                                  const std::string& linearContent) {
+    return InLineDocument("<Creatives><Creative><Linear " + linearAttributes + ">" + linearContent +
+                          "</Linear></Creative></Creatives>");
+}
+
+}  // namespace vasttest
