@@ -1,0 +1,301 @@
+// Document downloads through the source-IO module: open, wait for the size, read, close. The
+// module owns the network and its time limits; this side only polls it every 20 ms and watches
+// the caller's stop flag.
+#include "net/download.h"
+
+#include <cstring>
+#include <new>
+
+#include "ka/os_utils.h"
+#include "ka/result_codes.h"
+#include "ka/uri.h"
+#include "net/source_io_api.h"
+#include "platform/lib_loader.h"
+#include "platform/limits.h"
+
+namespace {
+
+constexpr uint32_t kPollMs = 20;
+constexpr uint32_t kNoTimeLimit = 0xFFFFFFFFu;
+constexpr uint64_t kNoRetryLimit = ~0ull;
+
+// The caller's flag, written by another of its threads: read it afresh on every poll.
+KA_BOOL FlagValue(const KA_BOOL* flag) {
+    return flag == nullptr ? 0 : *static_cast<const volatile KA_BOOL*>(flag);
+}
+
+bool IsStopped(const KA_BOOL* flag) { return FlagValue(flag) != 0; }
+
+// Closes and destroys a source handle the way every download ends.
+void ReleaseSource(SourceIOApi* api, void* handle) {
+    if (handle == nullptr) return;
+    if (api->Open != nullptr) api->Close(handle);
+    if (api->Init != nullptr) api->Uninit(handle);
+}
+
+// Init and Open for url; on success *handle is an open source. The handle may be set even on
+// failure and is then released by the caller.
+uint32_t OpenSource(SourceIOApi* api, char* url, void** handle, void* const* requests, char* text) {
+    if (api->Init == nullptr) return KA_ERR_DOWNLOAD_OPEN;
+    uint32_t result = api->Init(handle, url, 1, nullptr);
+    if (result != 0) return result;
+
+    if (requests != nullptr && *handle != nullptr) {
+        const uint32_t ids[] = {ka::kSioRequest1, ka::kSioRequest2, ka::kSioRequest3,
+                                ka::kSioRequest4};
+        for (int i = 0; i < 4; ++i) {
+            if (requests[i] != nullptr) api->SetParam(*handle, ids[i], requests[i]);
+        }
+        if (text != nullptr) api->SetParam(*handle, ka::kSioHostText, text);
+    }
+
+    if (*handle == nullptr || api->Open == nullptr) return KA_ERR_DOWNLOAD_OPEN;
+    return api->Open(*handle, 1);
+}
+
+// The work shared by DownloadToBuffer and DownloadWithAllocator; exactly one of the two buffer
+// targets is used, chosen by record->allocator when toBuffer is false.
+uint32_t HostDownload(SourceIOApi* api, void* const* requests, DownloadRecord* record,
+                      uint8_t** buffer, uint32_t* capacity, uint32_t* bytesRead, KA_BOOL* stopFlag,
+                      KA_BOOL useBase, void* outRecord, char* text, bool toBuffer) {
+    if (record == nullptr) return KA_ERR_NULL_ARGUMENT;
+    if (toBuffer && (buffer == nullptr || capacity == nullptr || bytesRead == nullptr)) {
+        return KA_ERR_NULL_ARGUMENT;
+    }
+
+    char url[ka::kUrlSize] = {};
+    if (useBase != 0) {
+        char ref[ka::kUrlSize];
+        char base[ka::kUrlSize];
+        memcpy(ref, record->url, sizeof(ref));
+        memcpy(base, record->baseURL, sizeof(base));
+        ref[sizeof(ref) - 1] = '\0';
+        base[sizeof(base) - 1] = '\0';
+        CombineURL(url, ref, base);
+    } else {
+        memcpy(url, record->url, sizeof(url));
+    }
+    url[sizeof(url) - 1] = '\0';
+
+    // The host's table: the operations called unchecked below must be there.
+    if (api == nullptr || api->GetSourceSize == nullptr || api->Read == nullptr ||
+        api->GetParam == nullptr || api->SetParam == nullptr ||
+        (api->Init != nullptr && api->Uninit == nullptr) ||
+        (api->Open != nullptr && api->Close == nullptr)) {
+        return KA_ERR_DOWNLOAD_OPEN;
+    }
+    void* handle = nullptr;
+    uint32_t result = OpenSource(api, url, &handle, requests, text);
+
+    uint64_t sourceSize = 0;
+    while (result == 0) {
+        const uint32_t sizeResult = api->GetSourceSize(handle, &sourceSize);
+        if (sizeResult == KA_ERR_DOWNLOAD_FAILED) {
+            result = sizeResult;
+        } else if (sizeResult == 0 || IsStopped(stopFlag)) {
+            break;
+        } else {
+            SleepMs(kPollMs);
+        }
+    }
+    if (result == 0 && sourceSize > KA_DOWNLOAD_MAX_SIZE) result = KA_ERR_LOAD_FAILED;
+
+    if (result == 0) {
+        const uint32_t size = static_cast<uint32_t>(sourceSize);
+        // Hosts are given three times the source size of room.
+        const uint32_t room = size * 3;
+        uint8_t* target = nullptr;
+        uint32_t* count = nullptr;
+        if (toBuffer) {
+            if (*capacity < room || (*buffer == nullptr && room != 0)) {
+                uint8_t* old = *buffer;
+                delete[] old;
+                *buffer = new (std::nothrow) uint8_t[room];
+                *capacity = *buffer != nullptr ? room : 0;
+            }
+            if (*buffer == nullptr && room != 0) {
+                result = KA_ERR_LOAD_FAILED;
+            } else {
+                if (*buffer != nullptr && *capacity != 0) memset(*buffer, 0, *capacity);
+                *bytesRead = size;
+                target = *buffer;
+                count = bytesRead;
+            }
+        } else if (record->allocator == nullptr || record->allocator->Allocate == nullptr) {
+            result = KA_ERR_LOAD_FAILED;
+        } else {
+            record->size = size;
+            record->capacity = room;
+            record->allocator->Allocate(record->allocator->context, &record->buffer, room);
+            // A host allocator that failed must not turn into a write through null.
+            if (record->buffer == nullptr && size != 0) {
+                result = KA_ERR_LOAD_FAILED;
+            } else {
+                target = record->buffer;
+                count = &record->size;
+            }
+        }
+        if (result == 0) {
+            result = ReadSourceData(api, handle, target, count, stopFlag, kNoRetryLimit);
+        }
+        if (result == 0 && toBuffer) {
+            record->buffer = *buffer;
+            record->size = *bytesRead;
+            record->capacity = room;
+        }
+    }
+
+    if (result == 0) {
+        ka::SourceFinalUrlQuery query = {url, static_cast<uint32_t>(strlen(url)), record->finalURL,
+                                         ka::kUrlSize};
+        if (api->GetParam(handle, ka::kSioFinalUrl, &query) != 0) {
+            memcpy(record->finalURL, url, sizeof(record->finalURL));
+        }
+        record->finalURL[sizeof(record->finalURL) - 1] = '\0';
+        if (IsStopped(stopFlag)) {
+            result = KA_ERR_LOAD_FAILED;
+        } else if (outRecord != nullptr) {
+            api->GetParam(handle, ka::kSioResponseInfo, outRecord);
+        }
+    }
+
+    ReleaseSource(api, handle);
+    return result;
+}
+
+}  // namespace
+
+uint32_t ReadSourceData(SourceIOApi* api, void* handle, uint8_t* dst, uint32_t* ioSize,
+                        KA_BOOL* stopFlag, uint64_t maxRetries, uint32_t timeoutMs) {
+    if (api == nullptr || ioSize == nullptr) return KA_ERR_NULL_ARGUMENT;
+    if (dst == nullptr && *ioSize != 0) return KA_ERR_NULL_ARGUMENT;
+    const uint32_t target = *ioSize;
+    *ioSize = 0;
+    const uint32_t start = GetTickCountMs();
+
+    // How the loop ended decides between 0 and 1 below.
+    bool endedByRead = false;
+    bool endedByStop = false;
+    bool queried = false;
+    uint32_t lastQuery = 0;
+
+    uint32_t position = 0;
+    while (position < target) {
+        if (IsStopped(stopFlag)) {
+            endedByStop = true;
+            break;
+        }
+        const uint32_t missing = target - position;
+        uint32_t got = 0;
+        const uint32_t result = api->Read(handle, dst + position, missing, &got);
+        // A module never hands out more than asked; do not trust it to.
+        if (got > missing) got = missing;
+        if (result == ka::kSioNotReady) {
+            SleepMs(kPollMs);
+            continue;
+        }
+        if (result == ka::kSioEnd) {
+            *ioSize += got;
+            return 1;
+        }
+        if (result != 0) return result;
+
+        if (maxRetries + 1 >= 2) {
+            uint64_t retries = 0;
+            lastQuery = api->GetParam(handle, ka::kSioRetryCount, &retries);
+            queried = true;
+            if (lastQuery != 0 || retries == 0) retries = 1;
+            if (retries > maxRetries) return KA_ERR_DOWNLOAD_TIMEOUT;
+        }
+        if (GetTickCountMs() - start > timeoutMs) {
+            *ioSize += got;
+            return KA_ERR_DOWNLOAD_TIMEOUT;
+        }
+        if (got < missing / 10) SleepMs(kPollMs);
+        *ioSize += got;
+        position += got;
+        if (position >= target) endedByRead = true;
+    }
+
+    if ((endedByRead || endedByStop) && queried && lastQuery == 1) return 1;
+    return FlagValue(stopFlag) == 1 ? KA_ERR_DOWNLOAD_FAILED : 0;
+}
+
+uint32_t ReadSourceData(SourceIOApi* api, void* handle, uint8_t* dst, uint32_t* ioSize,
+                        KA_BOOL* stopFlag, uint64_t maxRetries) {
+    return ReadSourceData(api, handle, dst, ioSize, stopFlag, maxRetries, kNoTimeLimit);
+}
+
+uint32_t ka_download_by_url(char* url, unsigned char** data, uint32_t* size, char* workPath,
+                            KA_BOOL* stopFlag) {
+    if (url == nullptr) return KA_ERR_NULL_ARGUMENT;
+    if (data == nullptr || size == nullptr) return KA_ERR_NULL_ARGUMENT;
+
+    CLibLoader loader;
+    strncpy(loader.mLibName, "kaSourceIO", sizeof(loader.mLibName) - 1);
+    strncpy(loader.mEntryName, "kaGetSourceIOAPI", sizeof(loader.mEntryName) - 1);
+    loader.SetWorkPath(workPath);
+    if (loader.LoadLib(nullptr) == 0 || loader.mEntry == nullptr) return KA_ERR_LOAD_FAILED;
+
+    SourceIOApi api;
+    memset(&api, 0, sizeof(api));
+    loader.mEntry(&api);
+    // The table is the module's: the operations the loop calls unchecked must be there.
+    if (api.SetParam == nullptr || api.GetSourceSize == nullptr || api.Read == nullptr ||
+        api.GetParam == nullptr || (api.Init != nullptr && api.Uninit == nullptr) ||
+        (api.Open != nullptr && api.Close == nullptr)) {
+        return KA_ERR_LOAD_FAILED;
+    }
+    api.SetParam(nullptr, ka::kSioWorkPath, workPath);
+
+    void* handle = nullptr;
+    uint32_t result = OpenSource(&api, url, &handle, nullptr, nullptr);
+    if (result == 0) {
+        uint64_t sourceSize = 0;
+        bool failed = false;
+        if (!IsStopped(stopFlag)) {
+            do {
+                const uint32_t sizeResult = api.GetSourceSize(handle, &sourceSize);
+                if (sizeResult == KA_ERR_DOWNLOAD_FAILED) {
+                    result = sizeResult;
+                    failed = true;
+                    break;
+                }
+                if (sizeResult == 0) break;
+                SleepMs(kPollMs);
+            } while (!IsStopped(stopFlag));
+        }
+        if (!failed) {
+            uint32_t count = static_cast<uint32_t>(sourceSize);
+            uint8_t* buffer = new (std::nothrow) uint8_t[count];
+            if (buffer == nullptr) {
+                result = KA_ERR_LOAD_FAILED;
+            } else {
+                memset(buffer, 0, count);
+                *data = buffer;
+                *size = count;
+                result = ReadSourceData(&api, handle, buffer, size, stopFlag, kNoRetryLimit,
+                                        kNoTimeLimit);
+            }
+        }
+    }
+    ReleaseSource(&api, handle);
+    return result;
+}
+
+uint32_t DownloadToBuffer(SourceIOApi* api, void* request1, void* request2, void* request3,
+                          void* request4, DownloadRecord* record, uint8_t** buffer,
+                          uint32_t* capacity, uint32_t* bytesRead, KA_BOOL* stopFlag,
+                          KA_BOOL useBase, void* outRecord, char* text) {
+    void* const requests[] = {request1, request2, request3, request4};
+    return HostDownload(api, requests, record, buffer, capacity, bytesRead, stopFlag, useBase,
+                        outRecord, text, true);
+}
+
+uint32_t DownloadWithAllocator(SourceIOApi* api, void* request1, void* request2, void* request3,
+                               void* request4, DownloadRecord* record, KA_BOOL* stopFlag,
+                               KA_BOOL useBase, void* outRecord, char* text) {
+    void* const requests[] = {request1, request2, request3, request4};
+    return HostDownload(api, requests, record, nullptr, nullptr, nullptr, stopFlag, useBase,
+                        outRecord, text, false);
+}
