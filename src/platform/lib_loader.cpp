@@ -5,6 +5,7 @@
 #include <cstring>
 
 #include "platform/bounded_string.h"
+#include "platform/cpu_info.h"
 
 namespace {
 
@@ -26,9 +27,15 @@ bool IsVariantModule(const char* path) {
 
 }  // namespace
 
-CLibLoader::CLibLoader() { Init(); }
+CLibLoader::CLibLoader() {
+    Init();
+    ka::ApplyCpuDefaults(*this, nullptr);
+}
 
-CLibLoader::CLibLoader(char* /*name*/) { Init(); }
+CLibLoader::CLibLoader(char* name) {
+    Init();
+    ka::ApplyCpuDefaults(*this, name);
+}
 
 void CLibLoader::Init() {
     mCpuCount = 1;
