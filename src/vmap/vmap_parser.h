@@ -1,0 +1,71 @@
+// CVMAPParser is the object behind every handle of the public table: it reads a VMAP document
+// into the AdInfo records, walking the tree through the XML module it holds as a CXMLDocument
+// and dispatching each element's direct children by name to one handler per parent element.
+#pragma once
+
+#include "ka/types.h"
+#include "ka/vast_records.h"
+#include "ka/vmap_records.h"
+#include "xml/xml_document.h"
+
+class CVASTParser;
+
+class CVMAPParser : public CXMLDocument {
+  public:
+    // A child handler: (child element, target record, element name, name length); always 0.
+    typedef unsigned int (CVMAPParser::*TagHandler)(void* node, void* target, char* name,
+                                                    unsigned int length);
+
+    CVMAPParser();
+    ~CVMAPParser() override;
+
+    // Virtual slots after the loader's, in this order: the public table calls them by slot.
+    // Stores workPath by pointer and loads the XML module: 0, Init's code, or 0x90000001.
+    virtual unsigned int Open(char* workPath);
+    // Releases every record and unloads the XML module; always 0.
+    virtual unsigned int Close();
+    // Releases the previous records, then reads the buffer: 0 or 0x91001000.
+    virtual unsigned int Process(void* buffer, unsigned int size);
+    // Writes the address of mAdInfo when out is not null; always 0.
+    virtual unsigned int GetAdInfo(AdInfo** out);
+    // Writes the owned VAST parser's container when one exists, else nothing; always 0.
+    virtual unsigned int GetVastAdData(VastAdData** out);
+    // The KA_PID_VMAP_* parameters; unknown identifiers are ignored; always 0.
+    virtual unsigned int SetParam(unsigned int id, void* value);
+    virtual unsigned int GetParam(unsigned int id, void* value);
+
+    // Close without unloading the module: the handle stays open; always 0.
+    unsigned int Reset();
+    // Frees the records of the last Process, leaving an empty AdInfo; always 0.
+    unsigned int ReleaseAdInfo();
+
+    // Calls handler for each direct child of node that has a name; always 0.
+    unsigned int LoadTag(void* node, void* target, TagHandler handler);
+    unsigned int LoadVMAPTag(void* node, void* target, char* name, unsigned int length);
+    unsigned int LoadAdBreakTag(void* node, void* target, char* name, unsigned int length);
+    unsigned int LoadAdSourceTag(void* node, void* target, char* name, unsigned int length);
+    unsigned int LoadTrackingTag(void* node, void* target, char* name, unsigned int length);
+    unsigned int ParseAdBreakAttributes(void* node, AdBreak* adBreak);
+    unsigned int ParseAdSourceAttributes(void* node, AdSource* source);
+    unsigned int ParseTrackingEvent(void* node, AdBreakTracking* tracking);
+
+    char* mContentUri;
+    AdInfo mAdInfo;
+    CVASTParser* mVastParser;
+    unsigned int mVastOnly;
+    unsigned int mMergeWrappers;
+    KA_BOOL* mStopFlag;
+
+  private:
+    // Everything Close does before unloading the module.
+    void ReleaseAll();
+    void ReadContentUri(void* extensions);
+    // Appends keep the last record of the list being filled, so long lists stay linear; a
+    // cursor that does not belong to the list at hand falls back to a walk from the head.
+    void AppendBreak(AdBreak* adBreak);
+    void AppendTracking(AdBreak* adBreak, AdBreakTracking* tracking);
+
+    AdBreak* mLastBreak;
+    AdBreak* mTrackingOwner;
+    AdBreakTracking* mLastTracking;
+};
