@@ -72,9 +72,9 @@ void CVASTParser::WalkWrappers(bool mergeWrappers) {
         AdData* next = ad->next;
         if (ad->type == AD_TYPE_WRAPPER && ad->body != nullptr) {
             if (mVastAdData.depth >= mMaxDepth) break;
-            // The wrapper chain hooks in here: the fetch of the wrapper's vastAdTagUri into a
-            // nested parser, then, when mergeWrappers is set, the merge of its result into ad.
-            (void)mergeWrappers;
+            // A failed fetch leaves no nested parser, and the merge then leaves the ad as read.
+            if (static_cast<AdWrapper*>(ad->body)->vastAdTagUri != nullptr) FetchWrapper(ad);
+            if (mergeWrappers) MergeWrapper(ad);
         }
         ad = next;
     }

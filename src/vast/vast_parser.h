@@ -66,6 +66,26 @@ public:
     unsigned int LoadMediaFileAttributes(void* node, AdMediaFile* mediaFile);
     unsigned int LoadTrackingAttributes(void* node, AdTracking* tracking);
 
+    // Wrapper chain (wrapper_chain.cpp).
+    // Downloads the ad's vastAdTagUri and parses it with a nested parser one level deeper,
+    // which the wrapper body then owns. 0 when there is nothing to fetch, 0x91001000 when the
+    // download fails or is empty, otherwise the nested Process result.
+    unsigned int FetchWrapper(AdData* ad);
+    // Puts the first ad of the nested parser's result in the wrapper ad's place and copies the
+    // wrapper's impressions, click tracking and tracking events into it; destroys the nested
+    // parser. Leaves the ad as it is without a nested parser. Always 0.
+    unsigned int MergeWrapper(AdData* ad);
+    // Copies the tracking of the wrapper's Linear creatives into every Linear creative of
+    // inlineCreatives.
+    unsigned int MergeCreatives(AdWrapper* wrapper, AdCreative* inlineCreatives);
+    // Appends copies of wrapperCreative's click tracking, custom clicks and tracking events to
+    // those of inlineCreative (both Linear) and sets their counts to the list lengths.
+    unsigned int MergeLinear(AdCreative* wrapperCreative, AdCreative* inlineCreative);
+    // Deep copies in list order, each node and string newly allocated; null for a null list.
+    AdImpression* CopyImpressionList(AdImpression* list);
+    AdClick* CopyClickList(AdClick* list);
+    AdTracking* CopyTrackingList(AdTracking* list);
+
     // Releases (vast_release.cpp): free everything below the record, null what they freed,
     // accept null and always return 0. They use no parser state.
     unsigned int ReleaseVastAdData(VastAdData* data);

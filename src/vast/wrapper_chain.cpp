@@ -1,0 +1,258 @@
+// The wrapper chain: a Wrapper ad's VASTAdTagURI is downloaded and parsed by a nested parser,
+// which follows its own wrappers first; the merge then puts the wrapped ad in the wrapper's
+// place and appends the wrapper's tracking after the ad's own. Merges run innermost first, so
+// an InLine ends with its own tracking, then its nearest wrapper's, then each outer one's.
+#include <cstdint>
+#include <cstring>
+#include <vector>
+
+#include "ka/result_codes.h"
+#include "net/download.h"
+#include "vast/vast_parser.h"
+
+namespace {
+
+char* CopyString(const char* text) {
+    if (text == nullptr) return nullptr;
+    const size_t length = strlen(text);
+    char* copy = new char[length + 1];
+    memcpy(copy, text, length + 1);
+    return copy;
+}
+
+// The end of a list being appended to: the link that receives the next node, and the number
+// of nodes before it. Found with one walk, then moved along each appended copy, so appending
+// many copies to a long list stays linear.
+template <typename T>
+struct ListEnd {
+    T** link;
+    uint32_t count;
+};
+
+template <typename T>
+ListEnd<T> FindEnd(T** head) {
+    ListEnd<T> end = {head, 0};
+    while (*end.link != nullptr) {
+        end.link = &(*end.link)->next;
+        ++end.count;
+    }
+    return end;
+}
+
+template <typename T>
+void Attach(ListEnd<T>& end, T* list) {
+    *end.link = list;
+    while (*end.link != nullptr) {
+        end.link = &(*end.link)->next;
+        ++end.count;
+    }
+}
+
+AdLinear* LinearOf(AdCreative* creative) {
+    return creative != nullptr && creative->kind == AD_CREATIVE_LINEAR ? &creative->content
+                                                                       : nullptr;
+}
+
+bool HasClicks(const AdVideoClicks* clicks) {
+    return clicks != nullptr &&
+           (clicks->clickTrackings != nullptr || clicks->customClicks != nullptr);
+}
+
+}  // namespace
+
+unsigned int CVASTParser::FetchWrapper(AdData* ad) {
+    if (ad == nullptr || ad->body == nullptr || ad->type != AD_TYPE_WRAPPER) return KA_OK;
+    AdWrapper* wrapper = static_cast<AdWrapper*>(ad->body);
+
+    // Without a caller's flag (a VAST element of a VMAP document) downloads get one that stays
+    // false: the download needs a flag to read.
+    KA_BOOL neverStop = 0;
+    KA_BOOL* stopFlag = mStopFlag != nullptr ? mStopFlag : &neverStop;
+    unsigned char* buffer = nullptr;
+    uint32_t size = 0;
+    const uint32_t downloaded =
+        ka_download_by_url(wrapper->vastAdTagUri, &buffer, &size, mWorkPath, stopFlag);
+    if (downloaded != 0 || size == 0 || buffer == nullptr) {
+        delete[] buffer;
+        return KA_ERR_LOAD_FAILED;
+    }
+
+    CVASTParser* nested = new CVASTParser();
+    wrapper->nestedParser = nested;
+    nested->SetWorkPath(mWorkPath);
+    // A failed load shows up as a failed Process below.
+    nested->InitXMLParser();
+    nested->mVastAdData.depth = mVastAdData.depth + 1;
+    // The nested parser reads the document and runs its own wrappers before this returns.
+    const unsigned int result = nested->Process(buffer, size, mMergeWrappers, mStopFlag);
+    delete[] buffer;
+    nested->Close();
+    return result;
+}
+
+unsigned int CVASTParser::MergeWrapper(AdData* ad) {
+    if (ad == nullptr || ad->type == AD_TYPE_INLINE) return KA_OK;
+    AdWrapper* wrapper = static_cast<AdWrapper*>(ad->body);
+    if (wrapper == nullptr || wrapper->nestedParser == nullptr) return KA_OK;
+    CVASTParser* nested = wrapper->nestedParser;
+    VastAdData& wrapped = nested->mVastAdData;
+
+    for (AdData* inner = wrapped.firstAd; inner != nullptr; inner = inner->next) {
+        if (inner->type == AD_TYPE_WRAPPER && inner->body != nullptr) {
+            AdWrapper* innerWrapper = static_cast<AdWrapper*>(inner->body);
+            if (innerWrapper->nestedParser != nullptr) {
+                CVASTParser* deeper = innerWrapper->nestedParser;
+                deeper->ReleaseVastAdData(&deeper->mVastAdData);
+                delete deeper;
+                innerWrapper->nestedParser = nullptr;
+            }
+        } else if (inner->type == AD_TYPE_INLINE && inner->body != nullptr) {
+            AdInLine* inLine = static_cast<AdInLine*>(inner->body);
+            ListEnd<AdImpression> end = FindEnd(&inLine->impressions);
+            Attach(end, CopyImpressionList(wrapper->impressions));
+            inLine->impressionCount = end.count;
+            MergeCreatives(wrapper, inLine->creatives);
+        }
+    }
+
+    AdData* const next = ad->next;
+    const int32_t sequence = ad->sequence;
+    // The nested parser is not released with the wrapper's data: its first ad moves below.
+    wrapper->nestedParser = nullptr;
+    ReleaseAdData(ad);
+
+    if (wrapped.errorUrl != nullptr && mVastAdData.errorUrl == nullptr) {
+        mVastAdData.errorUrl = wrapped.errorUrl;
+        wrapped.errorUrl = nullptr;
+    }
+    AdData* first = wrapped.firstAd;
+    if (first != nullptr) {
+        ad->id = first->id;
+        ad->type = first->type;
+        ad->body = first->body;
+        first->id = nullptr;
+        first->type = AD_TYPE_UNKNOWN;
+        first->body = nullptr;
+    }
+    // The resolved ad stands where the wrapper stood and keeps its sequence.
+    ad->next = next;
+    ad->sequence = sequence;
+
+    // Only the wrapped document's first ad survives.
+    nested->ReleaseVastAdData(&wrapped);
+    delete nested;
+    return KA_OK;
+}
+
+unsigned int CVASTParser::MergeCreatives(AdWrapper* wrapper, AdCreative* inlineCreatives) {
+    if (wrapper == nullptr) return KA_OK;
+    // Every pair of Linear creatives gets a copy. Each InLine creative takes the wrapper
+    // creatives in their order, which gives the same lists as taking the wrapper creatives
+    // first, while each InLine list is walked to its end only once.
+    bool anyLinear = false;
+    std::vector<AdLinear*> sources;
+    for (AdCreative* c = wrapper->creatives; c != nullptr; c = c->next) {
+        AdLinear* linear = LinearOf(c);
+        if (linear == nullptr) continue;
+        anyLinear = true;
+        // A creative with nothing to copy changes no list.
+        if (linear->trackingEvents != nullptr || HasClicks(linear->videoClicks)) {
+            sources.push_back(linear);
+        }
+    }
+    if (!anyLinear) return KA_OK;
+
+    for (AdCreative* d = inlineCreatives; d != nullptr; d = d->next) {
+        AdLinear* target = LinearOf(d);
+        if (target == nullptr) continue;
+        for (AdVideoClicks* v = target->videoClicks; v != nullptr; v = v->next) {
+            ListEnd<AdClick> trackings = FindEnd(&v->clickTrackings);
+            ListEnd<AdClick> customs = FindEnd(&v->customClicks);
+            bool trackingsCopied = false;
+            bool customsCopied = false;
+            for (AdLinear* source : sources) {
+                // Only the first VideoClicks of the wrapper creative is read.
+                const AdVideoClicks* u = source->videoClicks;
+                if (u == nullptr) continue;
+                if (u->clickTrackings != nullptr) {
+                    Attach(trackings, CopyClickList(u->clickTrackings));
+                    trackingsCopied = true;
+                }
+                if (u->customClicks != nullptr) {
+                    Attach(customs, CopyClickList(u->customClicks));
+                    customsCopied = true;
+                }
+            }
+            if (trackingsCopied) v->clickTrackingCount = trackings.count;
+            if (customsCopied) v->customClickCount = customs.count;
+        }
+        ListEnd<AdTracking> events = FindEnd(&target->trackingEvents);
+        for (AdLinear* source : sources) Attach(events, CopyTrackingList(source->trackingEvents));
+        target->trackingCount = events.count;
+    }
+    return KA_OK;
+}
+
+unsigned int CVASTParser::MergeLinear(AdCreative* wrapperCreative, AdCreative* inlineCreative) {
+    AdLinear* source = LinearOf(wrapperCreative);
+    AdLinear* target = LinearOf(inlineCreative);
+    if (source == nullptr || target == nullptr) return KA_OK;
+    const AdVideoClicks* u = source->videoClicks;
+    for (AdVideoClicks* v = target->videoClicks; v != nullptr && u != nullptr; v = v->next) {
+        if (u->clickTrackings != nullptr) {
+            ListEnd<AdClick> end = FindEnd(&v->clickTrackings);
+            Attach(end, CopyClickList(u->clickTrackings));
+            v->clickTrackingCount = end.count;
+        }
+        if (u->customClicks != nullptr) {
+            ListEnd<AdClick> end = FindEnd(&v->customClicks);
+            Attach(end, CopyClickList(u->customClicks));
+            v->customClickCount = end.count;
+        }
+    }
+    // The wrapper's click-through is not copied: the InLine's own destination stands.
+    ListEnd<AdTracking> events = FindEnd(&target->trackingEvents);
+    Attach(events, CopyTrackingList(source->trackingEvents));
+    target->trackingCount = events.count;
+    return KA_OK;
+}
+
+AdImpression* CVASTParser::CopyImpressionList(AdImpression* list) {
+    AdImpression* head = nullptr;
+    AdImpression** link = &head;
+    for (; list != nullptr; list = list->next) {
+        AdImpression* copy = new AdImpression();
+        copy->url = CopyString(list->url);
+        *link = copy;
+        link = &copy->next;
+    }
+    return head;
+}
+
+AdClick* CVASTParser::CopyClickList(AdClick* list) {
+    AdClick* head = nullptr;
+    AdClick** link = &head;
+    for (; list != nullptr; list = list->next) {
+        AdClick* copy = new AdClick();
+        copy->id = CopyString(list->id);
+        copy->url = CopyString(list->url);
+        *link = copy;
+        link = &copy->next;
+    }
+    return head;
+}
+
+AdTracking* CVASTParser::CopyTrackingList(AdTracking* list) {
+    AdTracking* head = nullptr;
+    AdTracking** link = &head;
+    for (; list != nullptr; list = list->next) {
+        AdTracking* copy = new AdTracking();
+        copy->event = CopyString(list->event);
+        copy->offsetKind = list->offsetKind;
+        copy->offset = list->offset;
+        copy->url = CopyString(list->url);
+        *link = copy;
+        link = &copy->next;
+    }
+    return head;
+}
