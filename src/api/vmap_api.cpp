@@ -2,6 +2,7 @@
 // on the handle followed by the matching virtual operation of the CVMAPParser behind it.
 #include "ka/result_codes.h"
 #include "ka/vmap_parser_api.h"
+#include "vast/vast_parser.h"
 #include "vmap/vmap_parser.h"
 
 namespace _KANS_kaVMAPParser {
@@ -47,9 +48,11 @@ uint32_t kaVMAPParserGetVastAdData(void* handle, VastAdData** out) {
     return Parser(handle)->GetVastAdData(out);
 }
 
-uint32_t kaVMAPParserGetVastParserVastAdData(void* parser, VastAdData** /*out*/) {
+uint32_t kaVMAPParserGetVastParserVastAdData(void* parser, VastAdData** out) {
     if (parser == nullptr) return KA_ERR_NULL_ARGUMENT;
-    // Only a nested VAST parser holds a container to lend; nothing else yields one.
+    // The object is a CVASTParser such as an unmerged wrapper's nestedParser; its kind cannot
+    // be checked, so a handle passed here yields no meaningful container.
+    if (out != nullptr) *out = &static_cast<CVASTParser*>(parser)->mVastAdData;
     return KA_OK;
 }
 

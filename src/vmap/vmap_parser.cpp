@@ -6,6 +6,7 @@
 #include "ka/result_codes.h"
 #include "ka/vmap_parser_api.h"
 #include "platform/limits.h"
+#include "vast/vast_parser.h"
 #include "vmap/vmap_values.h"
 #include "xml/text_helpers.h"
 
@@ -37,7 +38,8 @@ CVMAPParser::CVMAPParser()
       mStopFlag(nullptr),
       mLastBreak(nullptr),
       mTrackingOwner(nullptr),
-      mLastTracking(nullptr) {}
+      mLastTracking(nullptr),
+      mBuiltVastOnly(0) {}
 
 CVMAPParser::~CVMAPParser() {
     ReleaseAll();
@@ -64,15 +66,21 @@ void CVMAPParser::ReleaseAll() {
     delete[] mContentUri;
     mContentUri = nullptr;
     ReleaseAdInfo();
-    // The VAST parser, once the handle owns one, is destroyed here as well.
+    DestroyVASTParser();
 }
 
 unsigned int CVMAPParser::Process(void* buffer, unsigned int size) {
     ReleaseAll();
     if (mVastOnly == 1) {
-        // Bare VAST documents are read by a VAST parser, which this handle does not carry:
-        // nothing can be built from the buffer.
-        return KA_ERR_LOAD_FAILED;
+        mBuiltVastOnly = 1;
+        CreateVASTParser();
+        KA_BOOL neverStop = 0;
+        KA_BOOL* stopFlag = mStopFlag != nullptr ? mStopFlag : &neverStop;
+        const unsigned int result =
+            mVastParser->Process(buffer, size, mMergeWrappers != 0 ? 1 : 0, stopFlag);
+        // The parser keeps the flag it was given; the local one is gone once this returns.
+        if (stopFlag == &neverStop) mVastParser->mStopFlag = nullptr;
+        return result;
     }
     if (buffer == nullptr || size == 0 || size > static_cast<unsigned int>(INT_MAX)) {
         return KA_ERR_LOAD_FAILED;
@@ -93,8 +101,9 @@ unsigned int CVMAPParser::GetAdInfo(AdInfo** out) {
     return KA_OK;
 }
 
-unsigned int CVMAPParser::GetVastAdData(VastAdData** /*out*/) {
+unsigned int CVMAPParser::GetVastAdData(VastAdData** out) {
     // Only a VAST parser has a container to lend; without one nothing is written.
+    if (mVastParser != nullptr && out != nullptr) *out = &mVastParser->mVastAdData;
     return KA_OK;
 }
 
@@ -131,13 +140,25 @@ unsigned int CVMAPParser::GetParam(unsigned int id, void* value) {
 }
 
 unsigned int CVMAPParser::ReleaseAdInfo() {
+    if (mVastParser != nullptr) {
+        if (mBuiltVastOnly == 1) {
+            mVastParser->ReleaseVastAdData(&mVastParser->mVastAdData);
+        } else {
+            // After a VMAP Process the container only repeats the records of the last ad
+            // source with inline VAST; they are freed with that source below.
+            mVastParser->mVastAdData = VastAdData();
+        }
+    }
+    mBuiltVastOnly = 0;
+
     // The breaks are released whatever the current mode: a VAST-only Process builds none, so
     // a list that exists belongs to an earlier VMAP Process and is freed exactly once here.
+    CVASTParser* spare = nullptr;
     AdBreak* adBreak = mAdInfo.adBreaks;
     for (uint32_t i = 0; i < mAdInfo.adBreakCount && adBreak != nullptr; ++i) {
         if (AdSource* source = adBreak->adSource) {
-            // Blocks are only created by the VAST hand-off, which owns the records inside.
-            delete source->vastAdData;
+            ReleaseVastBlock(source->vastAdData, spare);
+            source->vastAdData = nullptr;
             delete[] source->adTagUri;
             delete[] source->reservedText;
             delete source;
@@ -155,12 +176,76 @@ unsigned int CVMAPParser::ReleaseAdInfo() {
         delete adBreak;
         adBreak = next;
     }
+    delete spare;
     mAdInfo.adBreakCount = 0;
     mAdInfo.adBreaks = nullptr;
     mLastBreak = nullptr;
     mTrackingOwner = nullptr;
     mLastTracking = nullptr;
     return KA_OK;
+}
+
+void CVMAPParser::ReleaseVastBlock(VastAdData* block, CVASTParser*& spare) {
+    if (block == nullptr) return;
+    // The release uses no parser state; without the owned parser a plain one, never opened,
+    // does the work.
+    CVASTParser* releaser = mVastParser;
+    if (releaser == nullptr) {
+        if (spare == nullptr) spare = new CVASTParser();
+        releaser = spare;
+    }
+    releaser->ReleaseVastAdData(block);
+    delete block;
+}
+
+void CVMAPParser::CreateVASTParser() {
+    // Only ever called without a parser; one left over would keep its container's records
+    // with whoever copied them.
+    DestroyVASTParser();
+    mVastParser = new CVASTParser();
+    mVastParser->Open(mWorkPath);
+}
+
+void CVMAPParser::DestroyVASTParser() {
+    if (mVastParser == nullptr) return;
+    mVastParser->Close();
+    delete mVastParser;
+    mVastParser = nullptr;
+}
+
+unsigned int CVMAPParser::LoadVASTAdData(void* node, VastAdData* block) {
+    if (node == nullptr || block == nullptr) return KA_OK;
+    if (mVastParser == nullptr) CreateVASTParser();
+    void* vast = nullptr;
+    GetChildByName(node, Name("VAST"), &vast);
+    if (vast == nullptr) return KA_OK;
+    // The container's previous content belongs to the ad source that copied it.
+    mVastParser->mVastAdData = VastAdData();
+    mVastParser->mMergeWrappers = mMergeWrappers != 0 ? 1 : 0;
+    // The document stays this handle's: the VAST parser walks the node without closing it.
+    mVastParser->ParseVASTNode(vast, false, mMergeWrappers != 0);
+    *block = mVastParser->mVastAdData;
+    return KA_OK;
+}
+
+void CVMAPParser::SumLinearDuration(AdBreak* adBreak) {
+    if (adBreak == nullptr || adBreak->adSource == nullptr) return;
+    const VastAdData* data = adBreak->adSource->vastAdData;
+    if (data == nullptr || data->firstAd == nullptr || data->adCount == 0) return;
+    const AdData* ad = data->firstAd;
+    for (uint32_t i = 0; i < data->adCount && ad != nullptr; ++i, ad = ad->next) {
+        // Wrapper ads that were not merged carry no media of their own.
+        if (ad->type != AD_TYPE_INLINE || ad->body == nullptr) continue;
+        const AdInLine* inLine = static_cast<const AdInLine*>(ad->body);
+        if (inLine->creatives == nullptr || inLine->creativeCount == 0) continue;
+        const AdCreative* creative = inLine->creatives;
+        for (uint32_t j = 0; j < inLine->creativeCount && creative != nullptr;
+             ++j, creative = creative->next) {
+            if (creative->kind == AD_CREATIVE_LINEAR) {
+                adBreak->linearDuration += creative->content.duration;
+            }
+        }
+    }
 }
 
 unsigned int CVMAPParser::LoadTag(void* node, void* target, TagHandler handler) {
@@ -272,7 +357,7 @@ unsigned int CVMAPParser::LoadAdBreakTag(void* node, void* target, char* name,
         adBreak->adSource = new AdSource();
         ParseAdSourceAttributes(node, adBreak->adSource);
         LoadTag(node, adBreak->adSource, &CVMAPParser::LoadAdSourceTag);
-        // linearDuration comes from inline VAST ads, which the VAST hand-off reads.
+        SumLinearDuration(adBreak);
     } else if (IsTag(name, length, "vmap:TrackingEvents")) {
         LoadTag(node, adBreak, &CVMAPParser::LoadTrackingTag);
     }
@@ -306,9 +391,12 @@ unsigned int CVMAPParser::LoadAdSourceTag(void* node, void* target, char* name,
     if (IsTag(name, length, "vmap:AdTagURI")) {
         // Stored as text only; the player decides whether to fetch it.
         GetElementText(node, source->adTagUri);
+    } else if (IsTag(name, length, "vmap:VASTAdData") || IsTag(name, length, "vmap:VASTData")) {
+        // Only the first of either is read.
+        if (source->vastAdData != nullptr) return KA_OK;
+        source->vastAdData = new VastAdData();
+        LoadVASTAdData(node, source->vastAdData);
     }
-    // vmap:VASTAdData and vmap:VASTData are read by the VAST hand-off; until then they are
-    // skipped like any other element.
     return KA_OK;
 }
 

@@ -1,6 +1,8 @@
 // CVMAPParser is the object behind every handle of the public table: it reads a VMAP document
 // into the AdInfo records, walking the tree through the XML module it holds as a CXMLDocument
 // and dispatching each element's direct children by name to one handler per parent element.
+// VAST documents, inline in an ad source or bare in VAST-only mode, go to the one CVASTParser
+// the handle owns.
 #pragma once
 
 #include "ka/types.h"
@@ -11,7 +13,7 @@
 class CVASTParser;
 
 class CVMAPParser : public CXMLDocument {
-  public:
+public:
     // A child handler: (child element, target record, element name, name length); always 0.
     typedef unsigned int (CVMAPParser::*TagHandler)(void* node, void* target, char* name,
                                                     unsigned int length);
@@ -39,6 +41,17 @@ class CVMAPParser : public CXMLDocument {
     // Frees the records of the last Process, leaving an empty AdInfo; always 0.
     unsigned int ReleaseAdInfo();
 
+    // The owned VAST parser: created and opened on the working path (Open's result is not
+    // looked at), and closed and destroyed. Destroying it does not release its container.
+    void CreateVASTParser();
+    void DestroyVASTParser();
+    // Reads the VAST child of a vmap:VASTAdData / vmap:VASTData element into block, which then
+    // owns the records; no VAST child leaves the block as it is. Always 0.
+    unsigned int LoadVASTAdData(void* node, VastAdData* block);
+    // Adds the durations of the linear creatives of the break's inline InLine ads to its
+    // linearDuration.
+    void SumLinearDuration(AdBreak* adBreak);
+
     // Calls handler for each direct child of node that has a name; always 0.
     unsigned int LoadTag(void* node, void* target, TagHandler handler);
     unsigned int LoadVMAPTag(void* node, void* target, char* name, unsigned int length);
@@ -56,10 +69,12 @@ class CVMAPParser : public CXMLDocument {
     unsigned int mMergeWrappers;
     KA_BOOL* mStopFlag;
 
-  private:
+private:
     // Everything Close does before unloading the module.
     void ReleaseAll();
     void ReadContentUri(void* extensions);
+    // Frees the VAST records of an ad source's block, then the block.
+    void ReleaseVastBlock(VastAdData* block, CVASTParser*& releaser);
     // Appends keep the last record of the list being filled, so long lists stay linear; a
     // cursor that does not belong to the list at hand falls back to a walk from the head.
     void AppendBreak(AdBreak* adBreak);
@@ -68,4 +83,8 @@ class CVMAPParser : public CXMLDocument {
     AdBreak* mLastBreak;
     AdBreak* mTrackingOwner;
     AdBreakTracking* mLastTracking;
+    // 1 when the records of the last Process are the VAST parser's own container (a VAST-only
+    // Process), 0 when they are the AdBreak list. The caller may switch mVastOnly between
+    // Processes, so releases go by this, not by the current mode.
+    unsigned int mBuiltVastOnly;
 };

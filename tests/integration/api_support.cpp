@@ -6,6 +6,8 @@
 #include <cstdlib>
 #include <cstring>
 
+#include "ka/download.h"
+
 namespace katest {
 
 namespace {
@@ -35,6 +37,22 @@ const VMAPParserAPI& Api() {
         return table;
     }();
     return api;
+}
+
+void AllowLocalFiles(bool allow) {
+    // The library loads the module from the same path; the module stays loaded once opened.
+    static SourceIOApi* api = [] {
+        const std::string path = std::string(KA_MODULES_DIR) + "libkaSourceIO.so";
+        void* module = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
+        if (module == nullptr) abort();
+        auto entry = reinterpret_cast<KaGetSourceIOAPIFn>(dlsym(module, "kaGetSourceIOAPI"));
+        static SourceIOApi table = {};
+        if (entry == nullptr || entry(&table) != 0 || table.SetParam == nullptr) abort();
+        return &table;
+    }();
+    const uint32_t kAllowFiles = 0x7a000003;
+    uint32_t value = allow ? 1 : 0;
+    api->SetParam(nullptr, kAllowFiles, &value);
 }
 
 std::vector<char> ReadFile(const std::string& path) {

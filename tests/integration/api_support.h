@@ -14,6 +14,10 @@ const VMAPParserAPI& Api();
 // Address of a symbol of the loaded library, or null.
 void* LibrarySymbol(const char* name);
 
+// Lets the source-IO module (the instance the library uses) read local files, or stops it; wrapped
+// documents in the test data are then fetched without a network.
+void AllowLocalFiles(bool allow);
+
 // Contents of a file; empty when it cannot be read.
 std::vector<char> ReadFile(const std::string& path);
 // Contents of a file below tests/data/.
@@ -21,7 +25,7 @@ std::vector<char> ReadTestData(const std::string& relative);
 
 // A handle opened on the real modules and closed when it goes out of scope.
 class Handle {
-  public:
+public:
     Handle();
     ~Handle();
     Handle(const Handle&) = delete;
@@ -34,7 +38,7 @@ class Handle {
     AdInfo* Info() const;
     const char* ContentUri() const;
 
-  private:
+private:
     std::string mWorkPath;  // the handle keeps the path by pointer
     void* mHandle;
     uint32_t mOpenResult;

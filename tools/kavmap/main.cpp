@@ -4,11 +4,14 @@
 
 #include <cerrno>
 #include <cinttypes>
+#include <climits>
 #include <cstdio>
+#include <cstdlib>
 #include <cstring>
 #include <string>
 #include <vector>
 
+#include "ka/download.h"
 #include "ka/vmap_parser_api.h"
 #include "printer.h"
 #include "result_text.h"
@@ -17,6 +20,11 @@ namespace {
 
 // Bigger documents are no ad playlists; refusing them keeps the size within 32 bits.
 constexpr size_t kMaxDocumentSize = 256u << 20;
+
+// Module-wide settings of the source-IO module (SetParam on a null handle): a non-zero
+// uint32_t lets it read local files, and the folder against which relative paths are read.
+constexpr uint32_t kSourceAllowFiles = 0x7a000003;
+constexpr uint32_t kSourceFileBaseDir = 0x7a000004;
 
 struct Options {
     bool vastOnly = false;
@@ -30,7 +38,7 @@ struct Options {
 int Usage() {
     fputs(
         "usage: kavmap [--vast] [--no-merge] [--json] [--modules DIR] [--lib PATH] DOCUMENT\n"
-        "  DOCUMENT     a VMAP file, or - for standard input\n"
+        "  DOCUMENT     a VMAP file, - for standard input, or an http(s) URL\n"
         "  --vast       read DOCUMENT as a bare VAST document\n"
         "  --no-merge   do not merge wrapper ads into the ads they lead to\n"
         "  --json       print the records as JSON\n"
@@ -120,6 +128,92 @@ void ReportFailure(const char* step, uint32_t code) {
     fprintf(stderr, "kavmap: %s failed: 0x%08" PRIx32 " (%s)\n", step, code, ResultText(code));
 }
 
+// The source-IO module, loaded from the path the library loads it from, so that both use the
+// same instance: its module-wide settings then hold for the library's downloads too. The
+// module stays loaded for the life of the process (it is linked with -z nodelete).
+class SourceModule {
+public:
+    explicit SourceModule(const std::string& modulesDir) : mApi() {
+        const std::string path = modulesDir + "libkaSourceIO.so";
+        void* module = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
+        if (module == nullptr) {
+            mError = dlerror();
+            return;
+        }
+        auto entry = reinterpret_cast<KaGetSourceIOAPIFn>(dlsym(module, "kaGetSourceIOAPI"));
+        if (entry == nullptr || entry(&mApi) != 0 || mApi.SetParam == nullptr) {
+            mApi = SourceIOApi();
+            mError = path + " has no usable kaGetSourceIOAPI";
+        }
+    }
+
+    bool ok() const { return mApi.SetParam != nullptr; }
+    const std::string& error() const { return mError; }
+    SourceIOApi* api() { return &mApi; }
+
+    // Local files, relative paths taken from dir: wrapped documents of a local document resolve
+    // without a network.
+    void AllowFilesBelow(const std::string& dir) {
+        uint32_t one = 1;
+        mApi.SetParam(nullptr, kSourceAllowFiles, &one);
+        mApi.SetParam(nullptr, kSourceFileBaseDir, const_cast<char*>(dir.c_str()));
+    }
+
+private:
+    SourceIOApi mApi;
+    std::string mError;
+};
+
+// The absolute folder of a local document ("-": the current one), with a trailing "/".
+std::string DocumentDir(const std::string& document) {
+    char resolved[PATH_MAX];
+    std::string dir;
+    if (document == "-") {
+        if (getcwd(resolved, sizeof(resolved)) != nullptr) dir = resolved;
+    } else if (realpath(document.c_str(), resolved) != nullptr) {
+        dir = resolved;
+        dir.erase(dir.rfind('/') + 1);
+    }
+    if (!dir.empty() && dir.back() != '/') dir += '/';
+    return dir;
+}
+
+// Fetches url through the library's DownloadToBuffer; false with a message on failure.
+bool FetchDocument(void* library, SourceModule& module, const std::string& url,
+                   std::vector<char>& data) {
+    typedef uint32_t (*DownloadFn)(SourceIOApi*, void*, void*, void*, void*, DownloadRecord*,
+                                   uint8_t**, uint32_t*, uint32_t*, KA_BOOL*, KA_BOOL, void*,
+                                   char*);
+    auto download = reinterpret_cast<DownloadFn>(dlsym(library, "DownloadToBuffer"));
+    if (download == nullptr) {
+        fprintf(stderr, "kavmap: the library has no DownloadToBuffer\n");
+        return false;
+    }
+    if (url.size() >= KA_DOWNLOAD_URL_SIZE) {
+        fprintf(stderr, "kavmap: the URL is longer than %d bytes\n", KA_DOWNLOAD_URL_SIZE - 1);
+        return false;
+    }
+    // Too large for the stack of small threads; one record per run is enough.
+    static DownloadRecord record;
+    memset(&record, 0, sizeof(record));
+    memcpy(record.url, url.c_str(), url.size() + 1);
+    uint8_t* buffer = nullptr;
+    uint32_t capacity = 0;
+    uint32_t bytesRead = 0;
+    const uint32_t result = download(module.api(), nullptr, nullptr, nullptr, nullptr, &record,
+                                     &buffer, &capacity, &bytesRead, nullptr, 0, nullptr, nullptr);
+    if (result == KA_OK && buffer != nullptr && bytesRead <= capacity) {
+        data.assign(buffer, buffer + bytesRead);
+    }
+    delete[] buffer;
+    if (result != KA_OK) {
+        fprintf(stderr, "kavmap: download of %s failed: 0x%08" PRIx32 " (%s)\n", url.c_str(),
+                result, ResultText(result));
+        return false;
+    }
+    return true;
+}
+
 int Run(const Options& options, const VMAPParserAPI& api, std::vector<char>& document) {
     std::string workPath = options.modulesDir;  // kept alive until Close, as the library asks
     void* handle = nullptr;
@@ -152,6 +246,8 @@ int Run(const Options& options, const VMAPParserAPI& api, std::vector<char>& doc
     VastAdData* vast = nullptr;
     api.GetVastAdData(handle, &vast);
     records.vastAdData = vast;
+    records.nestedVast = api.GetVastParserVastAdData;
+    records.vastOnly = options.vastOnly;
     if (options.json) {
         PrintJson(stdout, records);
     } else {
@@ -166,14 +262,10 @@ int Run(const Options& options, const VMAPParserAPI& api, std::vector<char>& doc
 int main(int argc, char** argv) {
     Options options;
     if (ParseArguments(argc, argv, options) != 0) return 2;
-    if (IsUrl(options.document)) {
-        fprintf(stderr, "kavmap: %s: documents by URL are not supported; save it to a file\n",
-                options.document.c_str());
-        return 2;
-    }
+    const bool isUrl = IsUrl(options.document);
 
     std::vector<char> document;
-    if (!ReadDocument(options.document, document)) return 1;
+    if (!isUrl && !ReadDocument(options.document, document)) return 1;
 
     void* library = dlopen(options.libPath.c_str(), RTLD_NOW | RTLD_LOCAL);
     if (library == nullptr) {
@@ -188,6 +280,24 @@ int main(int argc, char** argv) {
     }
     VMAPParserAPI api = {};
     getApi(&api);
+
+    // Wrapped documents are fetched through the same module; without it they just fail.
+    SourceModule module(options.modulesDir);
+    if (isUrl) {
+        if (!module.ok()) {
+            fprintf(stderr, "kavmap: cannot load the source-IO module: %s\n",
+                    module.error().c_str());
+            dlclose(library);
+            return 1;
+        }
+        if (!FetchDocument(library, module, options.document, document)) {
+            dlclose(library);
+            return 1;
+        }
+    } else if (module.ok()) {
+        const std::string dir = DocumentDir(options.document);
+        if (!dir.empty()) module.AllowFilesBelow(dir);
+    }
     const int status = Run(options, api, document);
     dlclose(library);
     return status;

@@ -2,6 +2,8 @@
 
 #include <cinttypes>
 
+#include "ka/result_codes.h"
+
 namespace {
 
 // Lists are walked at most as far as their count says, like the library does.
@@ -67,9 +69,161 @@ void PrintTimeOffset(FILE* out, const AdBreak& adBreak) {
     }
 }
 
-void PrintVastSummary(FILE* out, const char* indent, const VastAdData& data) {
-    fprintf(out, "%sVAST: %" PRIu32 " ads, depth %" PRIu32 ", error URL %s\n", indent, data.adCount,
+const char* TypeName(uint32_t type) {
+    switch (type) {
+        case AD_TYPE_INLINE:
+            return "InLine";
+        case AD_TYPE_WRAPPER:
+            return "Wrapper";
+        default:
+            return "unknown";
+    }
+}
+
+void Indent(FILE* out, int level) {
+    for (int i = 0; i < level; ++i) fputs("  ", out);
+}
+
+void PrintImpressions(FILE* out, int level, const AdImpression* impressions) {
+    ForEach(impressions, [out, level](const AdImpression& impression, uint32_t) {
+        Indent(out, level);
+        fprintf(out, "impression: %s\n", OrDash(impression.url));
+    });
+}
+
+void PrintClicks(FILE* out, int level, const char* what, const AdClick* clicks, uint32_t count) {
+    ForEach(clicks, count, [out, level, what](const AdClick& click, uint32_t) {
+        Indent(out, level);
+        fprintf(out, "%s", what);
+        if (click.id != nullptr) fprintf(out, " [%s]", click.id);
+        fprintf(out, ": %s\n", OrDash(click.url));
+    });
+}
+
+void PrintLinear(FILE* out, int level, const AdLinear& linear) {
+    Indent(out, level);
+    fputs("duration: ", out);
+    PrintClock(out, linear.duration);
+    fprintf(out, " (%" PRIu64 " ms), skip offset: ", linear.duration);
+    if (linear.skipOffset < 0) {
+        fputs("-\n", out);
+    } else {
+        fprintf(out, "%" PRId64 " ms\n", linear.skipOffset);
+    }
+    ForEach(linear.mediaFiles, linear.mediaFileCount,
+            [out, level](const AdMediaFile& file, uint32_t i) {
+                Indent(out, level);
+                fprintf(out,
+                        "media file %" PRIu32 ": %s %s %" PRId32 "x%" PRId32 ", id %" PRId32
+                        ", codec %s, bitrate %" PRId32 " (min %" PRId32 ", max %" PRId32
+                        "), scalable %" PRId32 ", maintainAspectRatio %" PRId32 "\n",
+                        i + 1, file.delivery == AD_DELIVERY_STREAMING ? "streaming" : "progressive",
+                        OrDash(file.type), file.width, file.height, file.id, OrDash(file.codec),
+                        file.bitrate, file.minBitrate, file.maxBitrate, file.scalable,
+                        file.maintainAspectRatio);
+                Indent(out, level + 1);
+                fprintf(out, "%s\n", OrDash(file.url));
+            });
+    if (linear.videoClicks != nullptr && linear.videoClicksCount != 0) {
+        const AdVideoClicks& clicks = *linear.videoClicks;
+        PrintClicks(out, level, "click through", clicks.clickThroughs, clicks.clickThroughCount);
+        PrintClicks(out, level, "click tracking", clicks.clickTrackings, clicks.clickTrackingCount);
+        PrintClicks(out, level, "custom click", clicks.customClicks, clicks.customClickCount);
+    }
+    if (linear.adParametersCount != 0) {
+        Indent(out, level);
+        fputs("ad parameters: present\n", out);
+    }
+    ForEach(linear.trackingEvents, linear.trackingCount,
+            [out, level](const AdTracking& tracking, uint32_t) {
+                Indent(out, level);
+                fprintf(out, "tracking %s", OrDash(tracking.event));
+                if (tracking.offsetKind == AD_OFFSET_TIME) {
+                    fprintf(out, " at %" PRId64 " ms", tracking.offset);
+                } else if (tracking.offsetKind == AD_OFFSET_PERCENT) {
+                    fprintf(out, " at %" PRId64 "%%", tracking.offset);
+                }
+                fprintf(out, ": %s\n", OrDash(tracking.url));
+            });
+}
+
+void PrintCreatives(FILE* out, int level, const AdCreative* creatives) {
+    ForEach(creatives, [out, level](const AdCreative& creative, uint32_t i) {
+        Indent(out, level);
+        fprintf(out, "creative %" PRIu32 ": id %s, sequence %" PRId32 ", adId %s, %s\n", i + 1,
+                OrDash(creative.id), creative.sequence, OrDash(creative.adId),
+                creative.kind == AD_CREATIVE_LINEAR ? "linear" : "not read");
+        if (creative.kind == AD_CREATIVE_LINEAR) PrintLinear(out, level + 1, creative.content);
+    });
+}
+
+void PrintVast(FILE* out, int level, const VastAdData& data, const ProcessResult& result,
+               unsigned int nesting);
+
+void PrintInLine(FILE* out, int level, const AdInLine& inLine) {
+    const struct {
+        const char* label;
+        const char* value;
+    } kTexts[] = {{"ad system", inLine.adSystem},      {"title", inLine.adTitle},
+                  {"description", inLine.description}, {"advertiser", inLine.advertiser},
+                  {"survey", inLine.survey},           {"error", inLine.error}};
+    for (const auto& text : kTexts) {
+        if (text.value == nullptr) continue;
+        Indent(out, level);
+        fprintf(out, "%s: %s\n", text.label, text.value);
+    }
+    Indent(out, level);
+    fprintf(out, "%" PRIu32 " impressions, %" PRIu32 " creatives%s\n", inLine.impressionCount,
+            inLine.creativeCount, inLine.extensions != nullptr ? ", extensions" : "");
+    PrintImpressions(out, level, inLine.impressions);
+    PrintCreatives(out, level, inLine.creatives);
+}
+
+void PrintWrapper(FILE* out, int level, const AdWrapper& wrapper, const ProcessResult& result,
+                  unsigned int nesting) {
+    Indent(out, level);
+    fprintf(out, "ad system: %s\n", OrDash(wrapper.adSystem));
+    Indent(out, level);
+    fprintf(out, "VAST ad tag URI: %s\n", OrDash(wrapper.vastAdTagUri));
+    if (wrapper.error != nullptr) {
+        Indent(out, level);
+        fprintf(out, "error: %s\n", wrapper.error);
+    }
+    if (wrapper.extensions != nullptr) {
+        Indent(out, level);
+        fputs("extensions: present\n", out);
+    }
+    PrintImpressions(out, level, wrapper.impressions);
+    PrintCreatives(out, level, wrapper.creatives);
+    if (wrapper.nestedParser == nullptr || result.nestedVast == nullptr) return;
+    Indent(out, level);
+    VastAdData* nested = nullptr;
+    if (nesting >= kMaxPrintedNesting ||
+        result.nestedVast(wrapper.nestedParser, &nested) != KA_OK || nested == nullptr) {
+        fputs("wrapped document: not shown\n", out);
+        return;
+    }
+    fputs("wrapped document:\n", out);
+    PrintVast(out, level + 1, *nested, result, nesting + 1);
+}
+
+void PrintVast(FILE* out, int level, const VastAdData& data, const ProcessResult& result,
+               unsigned int nesting) {
+    Indent(out, level);
+    fprintf(out, "VAST: %" PRIu32 " ads, depth %" PRIu32 ", error URL %s\n", data.adCount,
             data.depth, OrDash(data.errorUrl));
+    // Every ad of the list: a merge may have put more ads in it than the document had.
+    ForEach(data.firstAd, [out, level, &result, nesting](const AdData& ad, uint32_t i) {
+        Indent(out, level);
+        fprintf(out, "ad %" PRIu32 ": id %s, sequence %" PRId32 ", %s\n", i + 1, OrDash(ad.id),
+                ad.sequence, TypeName(ad.type));
+        if (ad.body == nullptr) return;
+        if (ad.type == AD_TYPE_INLINE) {
+            PrintInLine(out, level + 1, *static_cast<const AdInLine*>(ad.body));
+        } else if (ad.type == AD_TYPE_WRAPPER) {
+            PrintWrapper(out, level + 1, *static_cast<const AdWrapper*>(ad.body), result, nesting);
+        }
+    });
 }
 
 // JSON strings: quotes, backslashes and control characters escaped, other bytes as they are.
@@ -107,17 +261,255 @@ void JsonString(FILE* out, const char* text) {
     fputc('"', out);
 }
 
-void JsonVast(FILE* out, const VastAdData* data) {
+// One JSON object or array whose members go on lines of their own; level is the indentation
+// of the line that holds the opening bracket. An empty one prints as {} or [].
+class JsonBlock {
+public:
+    JsonBlock(FILE* out, int level, char open)
+        : mOut(out), mLevel(level), mClose(open == '{' ? '}' : ']'), mEmpty(true) {
+        fputc(open, out);
+    }
+    void Key(const char* key) {
+        Next();
+        fprintf(mOut, "\"%s\": ", key);
+    }
+    void Item() { Next(); }
+    // Indentation of blocks nested in this one.
+    int Inner() const { return mLevel + 1; }
+    void End() {
+        if (!mEmpty) {
+            fputc('\n', mOut);
+            Indent(mOut, mLevel);
+        }
+        fputc(mClose, mOut);
+    }
+
+private:
+    void Next() {
+        fputs(mEmpty ? "\n" : ",\n", mOut);
+        Indent(mOut, mLevel + 1);
+        mEmpty = false;
+    }
+
+    FILE* mOut;
+    int mLevel;
+    char mClose;
+    bool mEmpty;
+};
+
+void JsonKeyString(FILE* out, JsonBlock& block, const char* key, const char* value) {
+    block.Key(key);
+    JsonString(out, value);
+}
+
+void JsonKeyU64(FILE* out, JsonBlock& block, const char* key, uint64_t value) {
+    block.Key(key);
+    fprintf(out, "%" PRIu64, value);
+}
+
+void JsonKeyI64(FILE* out, JsonBlock& block, const char* key, int64_t value) {
+    block.Key(key);
+    fprintf(out, "%" PRId64, value);
+}
+
+// The extensions object belongs to the host that built it: only its presence is shown.
+void JsonExtensions(FILE* out, JsonBlock& block, const CAdExtensions* extensions) {
+    block.Key("extensions");
+    fputs(extensions != nullptr ? "{}" : "null", out);
+}
+
+void JsonImpressions(FILE* out, JsonBlock& parent, const AdImpression* impressions) {
+    parent.Key("impressions");
+    JsonBlock list(out, parent.Inner(), '[');
+    ForEach(impressions, [out, &list](const AdImpression& impression, uint32_t) {
+        list.Item();
+        fputs("{\"url\": ", out);
+        JsonString(out, impression.url);
+        fputc('}', out);
+    });
+    list.End();
+}
+
+void JsonClicks(FILE* out, JsonBlock& parent, const char* key, const AdClick* clicks,
+                uint32_t count) {
+    parent.Key(key);
+    JsonBlock list(out, parent.Inner(), '[');
+    ForEach(clicks, count, [out, &list](const AdClick& click, uint32_t) {
+        list.Item();
+        fputs("{\"id\": ", out);
+        JsonString(out, click.id);
+        fputs(", \"url\": ", out);
+        JsonString(out, click.url);
+        fputc('}', out);
+    });
+    list.End();
+}
+
+void JsonLinear(FILE* out, JsonBlock& parent, const AdLinear& linear) {
+    parent.Key("content");
+    JsonBlock o(out, parent.Inner(), '{');
+    JsonKeyU64(out, o, "duration", linear.duration);
+    JsonKeyI64(out, o, "skipOffset", linear.skipOffset);
+    JsonKeyU64(out, o, "mediaFileCount", linear.mediaFileCount);
+    o.Key("mediaFiles");
+    JsonBlock files(out, o.Inner(), '[');
+    ForEach(linear.mediaFiles, linear.mediaFileCount,
+            [out, &files](const AdMediaFile& f, uint32_t) {
+                files.Item();
+                JsonBlock file(out, files.Inner(), '{');
+                JsonKeyU64(out, file, "delivery", f.delivery);
+                JsonKeyString(out, file, "type", f.type);
+                JsonKeyI64(out, file, "width", f.width);
+                JsonKeyI64(out, file, "height", f.height);
+                JsonKeyString(out, file, "codec", f.codec);
+                JsonKeyI64(out, file, "id", f.id);
+                JsonKeyI64(out, file, "bitrate", f.bitrate);
+                JsonKeyI64(out, file, "minBitrate", f.minBitrate);
+                JsonKeyI64(out, file, "maxBitrate", f.maxBitrate);
+                JsonKeyI64(out, file, "scalable", f.scalable);
+                JsonKeyI64(out, file, "maintainAspectRatio", f.maintainAspectRatio);
+                JsonKeyString(out, file, "url", f.url);
+                file.End();
+            });
+    files.End();
+    JsonKeyU64(out, o, "videoClicksCount", linear.videoClicksCount);
+    o.Key("videoClicks");
+    if (linear.videoClicks == nullptr) {
+        fputs("null", out);
+    } else {
+        const AdVideoClicks& clicks = *linear.videoClicks;
+        JsonBlock c(out, o.Inner(), '{');
+        JsonKeyU64(out, c, "clickThroughCount", clicks.clickThroughCount);
+        JsonClicks(out, c, "clickThroughs", clicks.clickThroughs, clicks.clickThroughCount);
+        JsonKeyU64(out, c, "clickTrackingCount", clicks.clickTrackingCount);
+        JsonClicks(out, c, "clickTrackings", clicks.clickTrackings, clicks.clickTrackingCount);
+        JsonKeyU64(out, c, "customClickCount", clicks.customClickCount);
+        JsonClicks(out, c, "customClicks", clicks.customClicks, clicks.customClickCount);
+        c.End();
+    }
+    JsonKeyU64(out, o, "adParametersCount", linear.adParametersCount);
+    o.Key("adParameters");
+    JsonBlock parameters(out, o.Inner(), '[');
+    ForEach(linear.adParameters, linear.adParametersCount,
+            [out, &parameters](const AdParameters&, uint32_t) {
+                parameters.Item();
+                fputs("{}", out);
+            });
+    parameters.End();
+    JsonKeyU64(out, o, "trackingCount", linear.trackingCount);
+    o.Key("trackingEvents");
+    JsonBlock trackings(out, o.Inner(), '[');
+    ForEach(linear.trackingEvents, linear.trackingCount,
+            [out, &trackings](const AdTracking& t, uint32_t) {
+                trackings.Item();
+                fputs("{\"event\": ", out);
+                JsonString(out, t.event);
+                fprintf(out, ", \"offsetKind\": %" PRIu32 ", \"offset\": %" PRId64 ", \"url\": ",
+                        t.offsetKind, t.offset);
+                JsonString(out, t.url);
+                fputc('}', out);
+            });
+    trackings.End();
+    JsonKeyU64(out, o, "iconCount", linear.iconCount);
+    o.Key("icons");
+    JsonBlock icons(out, o.Inner(), '[');
+    ForEach(linear.icons, linear.iconCount, [out, &icons](const AdIcon&, uint32_t) {
+        icons.Item();
+        fputs("{}", out);
+    });
+    icons.End();
+    o.End();
+}
+
+void JsonCreatives(FILE* out, JsonBlock& parent, const AdCreative* creatives) {
+    parent.Key("creatives");
+    JsonBlock list(out, parent.Inner(), '[');
+    ForEach(creatives, [out, &list](const AdCreative& creative, uint32_t) {
+        list.Item();
+        JsonBlock o(out, list.Inner(), '{');
+        JsonKeyString(out, o, "id", creative.id);
+        JsonKeyI64(out, o, "sequence", creative.sequence);
+        JsonKeyString(out, o, "adId", creative.adId);
+        JsonKeyU64(out, o, "kind", creative.kind);
+        JsonLinear(out, o, creative.content);
+        o.End();
+    });
+    list.End();
+}
+
+void JsonVast(FILE* out, const VastAdData* data, int level, const ProcessResult& result,
+              unsigned int nesting);
+
+void JsonBody(FILE* out, JsonBlock& parent, const AdData& ad, const ProcessResult& result,
+              unsigned int nesting) {
+    parent.Key("body");
+    if (ad.body == nullptr || (ad.type != AD_TYPE_INLINE && ad.type != AD_TYPE_WRAPPER)) {
+        fputs("null", out);
+        return;
+    }
+    JsonBlock o(out, parent.Inner(), '{');
+    if (ad.type == AD_TYPE_INLINE) {
+        const AdInLine& inLine = *static_cast<const AdInLine*>(ad.body);
+        JsonKeyString(out, o, "adSystem", inLine.adSystem);
+        JsonKeyString(out, o, "adTitle", inLine.adTitle);
+        JsonKeyU64(out, o, "impressionCount", inLine.impressionCount);
+        JsonImpressions(out, o, inLine.impressions);
+        JsonKeyString(out, o, "description", inLine.description);
+        JsonKeyString(out, o, "advertiser", inLine.advertiser);
+        JsonKeyString(out, o, "survey", inLine.survey);
+        JsonKeyString(out, o, "error", inLine.error);
+        JsonExtensions(out, o, inLine.extensions);
+        JsonKeyU64(out, o, "creativeCount", inLine.creativeCount);
+        JsonCreatives(out, o, inLine.creatives);
+    } else {
+        const AdWrapper& wrapper = *static_cast<const AdWrapper*>(ad.body);
+        JsonKeyString(out, o, "adSystem", wrapper.adSystem);
+        JsonKeyString(out, o, "vastAdTagUri", wrapper.vastAdTagUri);
+        JsonKeyString(out, o, "error", wrapper.error);
+        JsonImpressions(out, o, wrapper.impressions);
+        JsonCreatives(out, o, wrapper.creatives);
+        JsonExtensions(out, o, wrapper.extensions);
+        // A nested parser is shown by the container it lends through the table.
+        o.Key("nestedParser");
+        VastAdData* nested = nullptr;
+        if (wrapper.nestedParser == nullptr) {
+            fputs("null", out);
+        } else if (result.nestedVast == nullptr || nesting >= kMaxPrintedNesting ||
+                   result.nestedVast(wrapper.nestedParser, &nested) != KA_OK || nested == nullptr) {
+            fputs("\"not shown\"", out);
+        } else {
+            JsonVast(out, nested, o.Inner(), result, nesting + 1);
+        }
+    }
+    o.End();
+}
+
+void JsonVast(FILE* out, const VastAdData* data, int level, const ProcessResult& result,
+              unsigned int nesting) {
     if (data == nullptr) {
         fputs("null", out);
         return;
     }
-    fprintf(out, "{\"adCount\": %" PRIu32 ", \"errorUrl\": ", data->adCount);
-    JsonString(out, data->errorUrl);
-    fprintf(out, ", \"depth\": %" PRIu32 "}", data->depth);
+    JsonBlock o(out, level, '{');
+    JsonKeyU64(out, o, "adCount", data->adCount);
+    o.Key("firstAd");
+    JsonBlock ads(out, o.Inner(), '[');
+    ForEach(data->firstAd, [out, &ads, &result, nesting](const AdData& ad, uint32_t) {
+        ads.Item();
+        JsonBlock a(out, ads.Inner(), '{');
+        JsonKeyString(out, a, "id", ad.id);
+        JsonKeyI64(out, a, "sequence", ad.sequence);
+        JsonKeyU64(out, a, "type", ad.type);
+        JsonBody(out, a, ad, result, nesting);
+        a.End();
+    });
+    ads.End();
+    JsonKeyString(out, o, "errorUrl", data->errorUrl);
+    JsonKeyU64(out, o, "depth", data->depth);
+    o.End();
 }
 
-void JsonSource(FILE* out, const AdSource* source) {
+void JsonSource(FILE* out, const AdSource* source, const ProcessResult& result) {
     if (source == nullptr) {
         fputs("null", out);
         return;
@@ -130,11 +522,11 @@ void JsonSource(FILE* out, const AdSource* source) {
     fputs(",\n        \"reservedText\": ", out);
     JsonString(out, source->reservedText);
     fputs(",\n        \"vastAdData\": ", out);
-    JsonVast(out, source->vastAdData);
+    JsonVast(out, source->vastAdData, 4, result, 0);
     fputs("\n      }", out);
 }
 
-void JsonBreak(FILE* out, const AdBreak& adBreak) {
+void JsonBreak(FILE* out, const AdBreak& adBreak, const ProcessResult& result) {
     fprintf(out,
             "    {\n      \"timeOffsetType\": %" PRIu32 ",\n      \"timeOffset\": %" PRId64
             ",\n      \"linearDuration\": %" PRIu64 ",\n      \"breakType\": %" PRIu32
@@ -143,7 +535,7 @@ void JsonBreak(FILE* out, const AdBreak& adBreak) {
     JsonString(out, adBreak.breakId);
     fprintf(out,
             ",\n      \"repeatAfter\": %" PRIu64 ",\n      \"adSource\": ", adBreak.repeatAfter);
-    JsonSource(out, adBreak.adSource);
+    JsonSource(out, adBreak.adSource, result);
     fputs(",\n      \"trackings\": [", out);
     ForEach(adBreak.trackings, [out](const AdBreakTracking& tracking, uint32_t i) {
         fputs(i == 0 ? "\n        {\"event\": " : ",\n        {\"event\": ", out);
@@ -161,9 +553,9 @@ void PrintText(FILE* out, const ProcessResult& result) {
     if (result.contentUri != nullptr) fprintf(out, "content URI: %s\n", result.contentUri);
     const AdInfo* info = result.adInfo;
     const uint32_t count = info != nullptr ? info->adBreakCount : 0;
-    fprintf(out, "%" PRIu32 " ad break%s\n", count, count == 1 ? "" : "s");
+    if (!result.vastOnly) fprintf(out, "%" PRIu32 " ad break%s\n", count, count == 1 ? "" : "s");
     if (info != nullptr) {
-        ForEach(info->adBreaks, count, [out](const AdBreak& adBreak, uint32_t i) {
+        ForEach(info->adBreaks, count, [out, &result](const AdBreak& adBreak, uint32_t i) {
             fprintf(out, "break %" PRIu32 ": id %s\n", i + 1, OrDash(adBreak.breakId));
             fputs("  time offset: ", out);
             PrintTimeOffset(out, adBreak);
@@ -184,7 +576,7 @@ void PrintText(FILE* out, const ProcessResult& result) {
                         source->id, source->allowMultipleAds, source->followRedirects);
                 fprintf(out, "    ad tag URI: %s\n", OrDash(source->adTagUri));
                 if (source->vastAdData != nullptr) {
-                    PrintVastSummary(out, "    ", *source->vastAdData);
+                    PrintVast(out, 2, *source->vastAdData, result, 0);
                 }
             } else {
                 fputs("  ad source: -\n", out);
@@ -194,7 +586,10 @@ void PrintText(FILE* out, const ProcessResult& result) {
             });
         });
     }
-    if (result.vastAdData != nullptr) PrintVastSummary(out, "", *result.vastAdData);
+    if (result.vastAdData == nullptr) return;
+    // After a VMAP document the handle's container repeats the last inline VAST document.
+    if (!result.vastOnly) fputs("handle's VAST container (the last inline document):\n", out);
+    PrintVast(out, result.vastOnly ? 0 : 1, *result.vastAdData, result, 0);
 }
 
 void PrintJson(FILE* out, const ProcessResult& result) {
@@ -204,12 +599,12 @@ void PrintJson(FILE* out, const ProcessResult& result) {
     JsonString(out, result.contentUri);
     fprintf(out, ",\n  \"adBreakCount\": %" PRIu32 ",\n  \"adBreaks\": [", count);
     if (info != nullptr) {
-        ForEach(info->adBreaks, count, [out](const AdBreak& adBreak, uint32_t i) {
+        ForEach(info->adBreaks, count, [out, &result](const AdBreak& adBreak, uint32_t i) {
             fputs(i == 0 ? "\n" : ",\n", out);
-            JsonBreak(out, adBreak);
+            JsonBreak(out, adBreak, result);
         });
     }
     fputs(count != 0 ? "\n  ],\n  \"vastAdData\": " : "],\n  \"vastAdData\": ", out);
-    JsonVast(out, result.vastAdData);
+    JsonVast(out, result.vastAdData, 1, result, 0);
     fputs("\n}\n", out);
 }
