@@ -4,7 +4,7 @@
 #include "ka/result_codes.h"
 #include "ka/vast_extension.h"
 #include "vast/vast_parser.h"
-#include "vast/vast_text.h"
+#include "xml/element_values.h"
 #include "xml/text_helpers.h"
 
 using ka::NameIs;

@@ -3,7 +3,7 @@
 
 #include "ka/result_codes.h"
 #include "vast/vast_parser.h"
-#include "vast/vast_text.h"
+#include "xml/element_values.h"
 
 using ka::NameIs;
 

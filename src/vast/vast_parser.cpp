@@ -82,20 +82,7 @@ void CVASTParser::WalkWrappers(bool mergeWrappers) {
 
 unsigned int CVASTParser::LoadTag(void* node, void* target, TagHandler handler) {
     if (node == nullptr || target == nullptr || handler == nullptr) return KA_OK;
-    void* child = nullptr;
-    GetFirstChild(node, &child);
-    while (child != nullptr) {
-        char* name = nullptr;
-        int length = 0;
-        GetTagName(child, &name, length);
-        if (name != nullptr && length >= 1) {
-            (this->*handler)(child, target, name, static_cast<unsigned int>(length));
-        }
-        // Written fresh each time: a lookup that fails without writing still ends the walk.
-        void* sibling = nullptr;
-        GetNextSibling(child, &sibling);
-        child = sibling;
-    }
+    ForEachChild(node, target, this, handler);
     return KA_OK;
 }
 

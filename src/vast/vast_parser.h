@@ -6,7 +6,7 @@
 
 #include "ka/types.h"
 #include "ka/vast_records.h"
-#include "vast/list_tail.h"
+#include "xml/list_tail.h"
 #include "xml/xml_document.h"
 
 class CExtensionParser;

@@ -8,24 +8,13 @@
 #include "platform/limits.h"
 #include "vast/vast_parser.h"
 #include "vmap/vmap_values.h"
+#include "xml/element_values.h"
 #include "xml/text_helpers.h"
 
 namespace {
 
 // The XML module's lookups take mutable names but never write to them.
 char* Name(const char* name) { return const_cast<char*>(name); }
-
-bool IsTag(const char* name, unsigned int length, const char* tag) {
-    return length == strlen(tag) && memcmp(name, tag, length) == 0;
-}
-
-// A copy of exactly length characters of text, terminated.
-char* CopyText(const char* text, int length) {
-    char* copy = new char[length + 1];
-    memcpy(copy, text, length);
-    copy[length] = '\0';
-    return copy;
-}
 
 }  // namespace
 
@@ -36,9 +25,8 @@ CVMAPParser::CVMAPParser()
       mVastOnly(0),
       mMergeWrappers(1),
       mStopFlag(nullptr),
-      mLastBreak(nullptr),
-      mTrackingOwner(nullptr),
-      mLastTracking(nullptr),
+      mBreakTail(),
+      mTrackingTail(),
       mBuiltVastOnly(0) {}
 
 CVMAPParser::~CVMAPParser() {
@@ -179,9 +167,8 @@ unsigned int CVMAPParser::ReleaseAdInfo() {
     delete spare;
     mAdInfo.adBreakCount = 0;
     mAdInfo.adBreaks = nullptr;
-    mLastBreak = nullptr;
-    mTrackingOwner = nullptr;
-    mLastTracking = nullptr;
+    mBreakTail.Reset();
+    mTrackingTail.Reset();
     return KA_OK;
 }
 
@@ -249,32 +236,20 @@ void CVMAPParser::SumLinearDuration(AdBreak* adBreak) {
 }
 
 unsigned int CVMAPParser::LoadTag(void* node, void* target, TagHandler handler) {
-    if (node == nullptr || target == nullptr) return KA_OK;
-    void* child = nullptr;
-    GetFirstChild(node, &child);
-    while (child != nullptr) {
-        char* name = nullptr;
-        int length = 0;
-        GetTagName(child, &name, length);
-        if (name != nullptr && length >= 1) {
-            (this->*handler)(child, target, name, static_cast<unsigned int>(length));
-        }
-        void* next = nullptr;
-        GetNextSibling(child, &next);
-        child = next;
-    }
+    if (node == nullptr || target == nullptr || handler == nullptr) return KA_OK;
+    ForEachChild(node, target, this, handler);
     return KA_OK;
 }
 
 unsigned int CVMAPParser::LoadVMAPTag(void* node, void* target, char* name, unsigned int length) {
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
     AdInfo* info = static_cast<AdInfo*>(target);
-    if (IsTag(name, length, "vmap:Extensions")) {
+    if (ka::NameIs(name, length, "vmap:Extensions")) {
         ReadContentUri(node);
-    } else if (IsTag(name, length, "vmap:AdBreak")) {
+    } else if (ka::NameIs(name, length, "vmap:AdBreak")) {
         ++info->adBreakCount;
         AdBreak* adBreak = new AdBreak();
-        AppendBreak(adBreak);
+        mBreakTail.Append(&mAdInfo.adBreaks, adBreak);
         ParseAdBreakAttributes(node, adBreak);
         LoadTag(node, adBreak, &CVMAPParser::LoadAdBreakTag);
     }
@@ -285,65 +260,23 @@ void CVMAPParser::ReadContentUri(void* extensions) {
     void* extension = nullptr;
     GetChildByName(extensions, Name("uo:unicornOnce"), &extension);
     if (extension == nullptr) return;
-    char* value = nullptr;
-    int length = 0;
-    GetAttributeValue(extension, Name("contenturi"), &value, length);
-    if (value == nullptr || length < 1) return;
-    delete[] mContentUri;
-    mContentUri = CopyText(value, length);
-    unescape_amp(mContentUri);
-}
-
-void CVMAPParser::AppendBreak(AdBreak* adBreak) {
-    AdBreak** slot = &mAdInfo.adBreaks;
-    if (mLastBreak != nullptr && mAdInfo.adBreaks != nullptr) {
-        slot = &mLastBreak->next;
-    } else {
-        while (*slot != nullptr) slot = &(*slot)->next;
-    }
-    *slot = adBreak;
-    mLastBreak = adBreak;
-}
-
-void CVMAPParser::AppendTracking(AdBreak* adBreak, AdBreakTracking* tracking) {
-    AdBreakTracking** slot = &adBreak->trackings;
-    if (mTrackingOwner == adBreak && mLastTracking != nullptr) {
-        slot = &mLastTracking->next;
-    } else {
-        while (*slot != nullptr) slot = &(*slot)->next;
-    }
-    *slot = tracking;
-    mTrackingOwner = adBreak;
-    mLastTracking = tracking;
+    if (ka::CopyAttribute(*this, extension, "contenturi", mContentUri)) unescape_amp(mContentUri);
 }
 
 unsigned int CVMAPParser::ParseAdBreakAttributes(void* node, AdBreak* adBreak) {
     if (node == nullptr || adBreak == nullptr) return KA_OK;
     char* value = nullptr;
     int length = 0;
-
-    GetAttributeValue(node, Name("breakType"), &value, length);
-    if (value != nullptr && length >= 1) adBreak->breakType |= ka::ParseBreakType(value, length);
-
-    value = nullptr;
-    length = 0;
-    GetAttributeValue(node, Name("breakId"), &value, length);
-    if (value != nullptr && length >= 1) {
-        delete[] adBreak->breakId;
-        adBreak->breakId = CopyText(value, length);
+    if (ka::ReadAttribute(*this, node, "breakType", &value, length)) {
+        adBreak->breakType |= ka::ParseBreakType(value, length);
     }
-
-    value = nullptr;
-    length = 0;
-    GetAttributeValue(node, Name("timeOffset"), &value, length);
-    if (value != nullptr && length >= 1) {
+    ka::CopyAttribute(*this, node, "breakId", adBreak->breakId);
+    if (ka::ReadAttribute(*this, node, "timeOffset", &value, length)) {
         ka::ParseTimeOffset(value, length, &adBreak->timeOffsetType, &adBreak->timeOffset);
     }
-
-    value = nullptr;
-    length = 0;
-    GetAttributeValue(node, Name("repeatAfter"), &value, length);
-    if (value != nullptr && length >= 1) adBreak->repeatAfter = ka::ParseRepeatAfter(value, length);
+    if (ka::ReadAttribute(*this, node, "repeatAfter", &value, length)) {
+        adBreak->repeatAfter = ka::ParseRepeatAfter(value, length);
+    }
     return KA_OK;
 }
 
@@ -351,14 +284,14 @@ unsigned int CVMAPParser::LoadAdBreakTag(void* node, void* target, char* name,
                                          unsigned int length) {
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
     AdBreak* adBreak = static_cast<AdBreak*>(target);
-    if (IsTag(name, length, "vmap:AdSource")) {
+    if (ka::NameIs(name, length, "vmap:AdSource")) {
         // The first source wins; a later one is skipped whole.
         if (adBreak->adSource != nullptr) return KA_OK;
         adBreak->adSource = new AdSource();
         ParseAdSourceAttributes(node, adBreak->adSource);
         LoadTag(node, adBreak->adSource, &CVMAPParser::LoadAdSourceTag);
         SumLinearDuration(adBreak);
-    } else if (IsTag(name, length, "vmap:TrackingEvents")) {
+    } else if (ka::NameIs(name, length, "vmap:TrackingEvents")) {
         LoadTag(node, adBreak, &CVMAPParser::LoadTrackingTag);
     }
     return KA_OK;
@@ -368,19 +301,13 @@ unsigned int CVMAPParser::ParseAdSourceAttributes(void* node, AdSource* source) 
     if (node == nullptr || source == nullptr) return KA_OK;
     char* value = nullptr;
     int length = 0;
-
-    GetAttributeValue(node, Name("id"), &value, length);
-    if (value != nullptr && length >= 1) source->id = ka::ParseDecimal(value);
-
-    value = nullptr;
-    length = 0;
-    GetAttributeValue(node, Name("allowMultipleAds"), &value, length);
-    if (value != nullptr && length >= 1) source->allowMultipleAds = strcmp(value, "true") == 0;
-
-    value = nullptr;
-    length = 0;
-    GetAttributeValue(node, Name("followRedirects"), &value, length);
-    if (value != nullptr && length >= 1) source->followRedirects = strcmp(value, "true") == 0;
+    if (ka::ReadAttribute(*this, node, "id", &value, length)) source->id = ka::ParseDecimal(value);
+    if (ka::ReadAttribute(*this, node, "allowMultipleAds", &value, length)) {
+        source->allowMultipleAds = strcmp(value, "true") == 0;
+    }
+    if (ka::ReadAttribute(*this, node, "followRedirects", &value, length)) {
+        source->followRedirects = strcmp(value, "true") == 0;
+    }
     return KA_OK;
 }
 
@@ -388,10 +315,10 @@ unsigned int CVMAPParser::LoadAdSourceTag(void* node, void* target, char* name,
                                           unsigned int length) {
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
     AdSource* source = static_cast<AdSource*>(target);
-    if (IsTag(name, length, "vmap:AdTagURI")) {
+    if (ka::NameIs(name, length, "vmap:AdTagURI")) {
         // Stored as text only; the player decides whether to fetch it.
         GetElementText(node, source->adTagUri);
-    } else if (IsTag(name, length, "vmap:VASTAdData") || IsTag(name, length, "vmap:VASTData")) {
+    } else if (ka::NameIs(name, length, "vmap:VASTAdData") || ka::NameIs(name, length, "vmap:VASTData")) {
         // Only the first of either is read.
         if (source->vastAdData != nullptr) return KA_OK;
         source->vastAdData = new VastAdData();
@@ -403,10 +330,10 @@ unsigned int CVMAPParser::LoadAdSourceTag(void* node, void* target, char* name,
 unsigned int CVMAPParser::LoadTrackingTag(void* node, void* target, char* name,
                                           unsigned int length) {
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
-    if (!IsTag(name, length, "vmap:Tracking")) return KA_OK;
+    if (!ka::NameIs(name, length, "vmap:Tracking")) return KA_OK;
     AdBreak* adBreak = static_cast<AdBreak*>(target);
     AdBreakTracking* tracking = new AdBreakTracking();
-    AppendTracking(adBreak, tracking);
+    mTrackingTail.Append(&adBreak->trackings, tracking);
     ParseTrackingEvent(node, tracking);
     GetElementText(node, tracking->url);
     return KA_OK;
@@ -414,12 +341,6 @@ unsigned int CVMAPParser::LoadTrackingTag(void* node, void* target, char* name,
 
 unsigned int CVMAPParser::ParseTrackingEvent(void* node, AdBreakTracking* tracking) {
     if (node == nullptr || tracking == nullptr) return KA_OK;
-    char* value = nullptr;
-    int length = 0;
-    GetAttributeValue(node, Name("event"), &value, length);
-    if (value != nullptr && length >= 1) {
-        delete[] tracking->event;
-        tracking->event = CopyText(value, length);
-    }
+    ka::CopyAttribute(*this, node, "event", tracking->event);
     return KA_OK;
 }

@@ -8,6 +8,7 @@
 #include "ka/types.h"
 #include "ka/vast_records.h"
 #include "ka/vmap_records.h"
+#include "xml/list_tail.h"
 #include "xml/xml_document.h"
 
 class CVASTParser;
@@ -75,14 +76,9 @@ private:
     void ReadContentUri(void* extensions);
     // Frees the VAST records of an ad source's block, then the block.
     void ReleaseVastBlock(VastAdData* block, CVASTParser*& releaser);
-    // Appends keep the last record of the list being filled, so long lists stay linear; a
-    // cursor that does not belong to the list at hand falls back to a walk from the head.
-    void AppendBreak(AdBreak* adBreak);
-    void AppendTracking(AdBreak* adBreak, AdBreakTracking* tracking);
-
-    AdBreak* mLastBreak;
-    AdBreak* mTrackingOwner;
-    AdBreakTracking* mLastTracking;
+    // The last records appended, so that long lists are filled in linear time.
+    ka::ListTail<AdBreak> mBreakTail;
+    ka::ListTail<AdBreakTracking> mTrackingTail;
     // 1 when the records of the last Process are the VAST parser's own container (a VAST-only
     // Process), 0 when they are the AdBreak list. The caller may switch mVastOnly between
     // Processes, so releases go by this, not by the current mode.

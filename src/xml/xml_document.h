@@ -38,4 +38,25 @@ public:
 
     void* mXMLHandle;
     XMLParserAPI mXMLAPI;
+
+protected:
+    // The child walk of both parsers' LoadTag: calls (parser->*handler)(child, target, name,
+    // length) for each direct child element with a non-empty name, in document order.
+    template <class Parser, class Handler>
+    void ForEachChild(void* node, void* target, Parser* parser, Handler handler) {
+        void* child = nullptr;
+        GetFirstChild(node, &child);
+        while (child != nullptr) {
+            char* name = nullptr;
+            int length = 0;
+            GetTagName(child, &name, length);
+            if (name != nullptr && length >= 1) {
+                (parser->*handler)(child, target, name, static_cast<unsigned int>(length));
+            }
+            // Written fresh each time: a lookup that fails without writing still ends the walk.
+            void* sibling = nullptr;
+            GetNextSibling(child, &sibling);
+            child = sibling;
+        }
+    }
 };

@@ -1,5 +1,5 @@
-// Small helpers of the VAST handlers: name matching, string copies, attribute lookups and the
-// raw element text with its CDATA section unwrapped.
+// Small helpers of both parsers' handlers: name matching, string copies, attribute lookups and
+// the raw element text with its CDATA section unwrapped.
 #pragma once
 
 #include <cstddef>

@@ -1,4 +1,4 @@
-#include "vast/vast_text.h"
+#include "xml/element_values.h"
 
 #include <cstring>
 
