@@ -1,32 +1,26 @@
 #include "api_support.h"
 
 #include <dlfcn.h>
+#include <gtest/gtest.h>
 
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <fstream>
+#include <iterator>
 
 #include "ka/download.h"
 
 namespace katest {
 
-namespace {
-
-void* Library() {
-    static void* library = [] {
-        void* handle = dlopen(KA_LIB_PATH, RTLD_NOW | RTLD_LOCAL);
-        if (handle == nullptr) {
-            fprintf(stderr, "cannot load %s: %s\n", KA_LIB_PATH, dlerror());
-            abort();
-        }
-        return handle;
-    }();
-    return library;
+void* LibrarySymbol(const char* name) {
+    static void* library = dlopen(KA_LIB_PATH, RTLD_NOW | RTLD_LOCAL);
+    if (library == nullptr) {
+        fprintf(stderr, "cannot load %s: %s\n", KA_LIB_PATH, dlerror());
+        abort();
+    }
+    return dlsym(library, name);
 }
-
-}  // namespace
-
-void* LibrarySymbol(const char* name) { return dlsym(Library(), name); }
 
 const VMAPParserAPI& Api() {
     static const VMAPParserAPI api = [] {
@@ -40,7 +34,7 @@ const VMAPParserAPI& Api() {
 }
 
 void AllowLocalFiles(bool allow) {
-    // The library loads the module from the same path; the module stays loaded once opened.
+    // The same file the library loads, hence the same instance; it stays loaded.
     static SourceIOApi* api = [] {
         const std::string path = std::string(KA_MODULES_DIR) + "libkaSourceIO.so";
         void* module = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
@@ -56,19 +50,16 @@ void AllowLocalFiles(bool allow) {
 }
 
 std::vector<char> ReadFile(const std::string& path) {
-    std::vector<char> data;
-    FILE* file = fopen(path.c_str(), "rb");
-    if (file == nullptr) return data;
-    char chunk[4096];
-    size_t n;
-    while ((n = fread(chunk, 1, sizeof(chunk), file)) > 0)
-        data.insert(data.end(), chunk, chunk + n);
-    fclose(file);
-    return data;
+    std::ifstream file(path, std::ios::binary);
+    return std::vector<char>(std::istreambuf_iterator<char>(file), {});
 }
 
 std::vector<char> ReadTestData(const std::string& relative) {
     return ReadFile(std::string(KA_TEST_DATA_DIR) + relative);
+}
+
+std::vector<char> ReadExample(const std::string& name) {
+    return ReadFile(std::string(KA_EXAMPLES_DIR) + name);
 }
 
 Handle::Handle() : mWorkPath(KA_MODULES_DIR), mHandle(nullptr) {
@@ -80,7 +71,7 @@ Handle::~Handle() {
 }
 
 uint32_t Handle::Process(std::vector<char> document) {
-    // A copy of its own, so that a record pointing into the caller's buffer would show.
+    // A copy freed on return: a record pointing into the buffer shows under ASan.
     return Api().Process(mHandle, document.data(), static_cast<uint32_t>(document.size()));
 }
 
@@ -100,10 +91,14 @@ const char* Handle::ContentUri() const {
     return uri;
 }
 
-AdBreak* BreakAt(const AdInfo* info, uint32_t index) {
-    AdBreak* adBreak = info != nullptr ? info->adBreaks : nullptr;
-    for (; adBreak != nullptr && index > 0; --index) adBreak = adBreak->next;
-    return adBreak;
+void Handle::SetFlag(uint32_t id, bool on) {
+    EXPECT_EQ(Api().SetParam(mHandle, id, on ? kUntouched : nullptr), KA_OK);
+}
+
+VastAdData* Handle::Container() const {
+    VastAdData* data = static_cast<VastAdData*>(kUntouched);
+    EXPECT_EQ(Api().GetVastAdData(mHandle, &data), KA_OK);
+    return data;
 }
 
 AdBreak* BreakById(const AdInfo* info, const char* id) {

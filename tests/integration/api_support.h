@@ -9,19 +9,20 @@
 
 namespace katest {
 
+// A value the library must not write over.
+void* const kUntouched = reinterpret_cast<void*>(0x5a5a);
+
 // The library from KA_LIB_PATH, loaded once per process, and its table.
 const VMAPParserAPI& Api();
-// Address of a symbol of the loaded library, or null.
 void* LibrarySymbol(const char* name);
 
-// Lets the source-IO module (the instance the library uses) read local files, or stops it; wrapped
-// documents in the test data are then fetched without a network.
+// Lets the source-IO module instance the library uses read local files, so that wrapped
+// documents in the test data are fetched without a network.
 void AllowLocalFiles(bool allow);
 
-// Contents of a file; empty when it cannot be read.
-std::vector<char> ReadFile(const std::string& path);
-// Contents of a file below tests/data/.
+std::vector<char> ReadFile(const std::string& path);  // empty when unreadable
 std::vector<char> ReadTestData(const std::string& relative);
+std::vector<char> ReadExample(const std::string& name);
 
 // A handle opened on the real modules and closed when it goes out of scope.
 class Handle {
@@ -37,6 +38,10 @@ public:
     uint32_t Process(const std::string& text);
     AdInfo* Info() const;
     const char* ContentUri() const;
+    // SetParam with a non-null value for true.
+    void SetFlag(uint32_t id, bool on);
+    // What GetVastAdData lends, or kUntouched when it writes nothing.
+    VastAdData* Container() const;
 
 private:
     std::string mWorkPath;  // the handle keeps the path by pointer
@@ -44,11 +49,7 @@ private:
     uint32_t mOpenResult;
 };
 
-// The break of the list at index, or null past the end.
-AdBreak* BreakAt(const AdInfo* info, uint32_t index);
-// The first break with the given breakId, or null.
-AdBreak* BreakById(const AdInfo* info, const char* id);
-// Number of records of a list.
+AdBreak* BreakById(const AdInfo* info, const char* id);  // the first match, or null
 template <typename Record>
 size_t Length(const Record* first) {
     size_t n = 0;
