@@ -33,8 +33,10 @@ TEST(Exports, ExactlyTheListedNames) {
     EXPECT_TRUE(listed.count("kaGetVMAPParserAPIAdapter"));
 
     std::set<std::string> exported;
-    FILE* pipe =
-        popen(("nm -D --defined-only '" + std::string(KA_LIB_PATH) + "' 2>&1").c_str(), "r");
+    // The toolchain's own nm: a cross build's library is not for the host's.
+    const std::string command =
+        "'" KA_NM_PATH "' -D --defined-only '" + std::string(KA_LIB_PATH) + "' 2>&1";
+    FILE* pipe = popen(command.c_str(), "r");
     ASSERT_NE(pipe, nullptr);
     char line[1024];
     while (fgets(line, sizeof(line), pipe) != nullptr) {
@@ -45,7 +47,7 @@ TEST(Exports, ExactlyTheListedNames) {
         name = name.substr(0, name.find('@'));
         if (!IsToolchainName(name)) exported.insert(name);
     }
-    ASSERT_EQ(pclose(pipe), 0) << "nm failed on " << KA_LIB_PATH;
+    ASSERT_EQ(pclose(pipe), 0) << KA_NM_PATH " failed on " << KA_LIB_PATH;
 
     for (const std::string& name : exported) {
         EXPECT_TRUE(listed.count(name)) << "exported but not listed: " << name;

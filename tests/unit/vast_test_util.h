@@ -1,5 +1,5 @@
 // Shared by the VAST parser tests: a fixture that runs documents through a real CVASTParser
-// over the stand-in XML module, and walks over the records it builds.
+// over the stand-in XML module, and helpers that walk the records it builds.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -9,6 +9,7 @@
 #include <fstream>
 #include <sstream>
 #include <string>
+#include <vector>
 
 #include "ka/result_codes.h"
 #include "ka/vast_records.h"
@@ -49,6 +50,14 @@ T* Nth(T* list, uint32_t index) {
 }
 
 inline std::string Str(const char* text) { return text == nullptr ? "<null>" : text; }
+
+// The url of every node of an impression, click or tracking list, in list order.
+template <typename T>
+std::vector<std::string> Urls(const T* list) {
+    std::vector<std::string> urls;
+    for (; list != nullptr; list = list->next) urls.push_back(Str(list->url));
+    return urls;
+}
 
 // Every count of the records equals the length of its list.
 inline void ExpectCountsMatch(const VastAdData& data) {
@@ -91,12 +100,10 @@ protected:
     }
 
     void TearDown() override {
-        if (mParser != nullptr) {
-            mParser->ReleaseVastAdData(&mParser->mVastAdData);
-            EXPECT_EQ(mParser->mVastAdData.firstAd, nullptr);
-            EXPECT_EQ(mParser->mVastAdData.errorUrl, nullptr);
-            delete mParser;
-        }
+        mParser->ReleaseVastAdData(&mParser->mVastAdData);
+        EXPECT_EQ(mParser->mVastAdData.firstAd, nullptr);
+        EXPECT_EQ(mParser->mVastAdData.errorUrl, nullptr);
+        delete mParser;
         // Nested parsers and every other library object are gone with the records.
         EXPECT_EQ(CSDKObject::g_kaSDKObjectNum, mObjectsBefore);
     }
@@ -110,23 +117,29 @@ protected:
         return result;
     }
 
-    // Opens again (Process closes the parser) and parses.
+    // Opens again (Process closes the parser) and parses after what is already held.
     unsigned int Reparse(const std::string& document) {
         EXPECT_EQ(mParser->Open(ModulesDir()), 0u);
         return Parse(document);
+    }
+
+    // Drops what is held, opens again and parses: one case of a table.
+    unsigned int Fresh(const std::string& document) {
+        mParser->ReleaseVastAdData(&mParser->mVastAdData);
+        return Reparse(document);
     }
 
     VastAdData& Data() { return mParser->mVastAdData; }
     AdData* Ad(uint32_t index) { return Nth(Data().firstAd, index); }
     AdInLine* InLine(uint32_t index) {
         AdData* ad = Ad(index);
-        if (ad == nullptr || ad->type != AD_TYPE_INLINE) return nullptr;
-        return static_cast<AdInLine*>(ad->body);
+        return ad == nullptr || ad->type != AD_TYPE_INLINE ? nullptr
+                                                           : static_cast<AdInLine*>(ad->body);
     }
     AdWrapper* Wrapper(uint32_t index) {
         AdData* ad = Ad(index);
-        if (ad == nullptr || ad->type != AD_TYPE_WRAPPER) return nullptr;
-        return static_cast<AdWrapper*>(ad->body);
+        return ad == nullptr || ad->type != AD_TYPE_WRAPPER ? nullptr
+                                                            : static_cast<AdWrapper*>(ad->body);
     }
     // The first creative of the first InLine ad of a document.
     AdCreative* FirstCreative() {
