@@ -230,9 +230,16 @@ unsigned int GetAttributeValue(void* handle, void* node, char* name, char** valu
         length == nullptr) {
         return KA_ERR_NULL_ARGUMENT;
     }
-    // Duplicate attributes are not refused; the first one is the one read.
-    pugi::xml_attribute attribute = AsNode(node).attribute(name);
-    if (attribute) SetString(attribute.value(), value, length);
+    // Duplicate attributes are not refused; the first one is the one read. The first byte is
+    // compared before the whole name: the library asks for many names that are absent.
+    for (pugi::xml_attribute attribute = AsNode(node).first_attribute(); attribute;
+         attribute = attribute.next_attribute()) {
+        const char* candidate = attribute.name();
+        if (candidate[0] == name[0] && strcmp(candidate, name) == 0) {
+            SetString(attribute.value(), value, length);
+            break;
+        }
+    }
     return KA_OK;
 }
 

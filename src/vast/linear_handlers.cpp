@@ -1,5 +1,4 @@
 // Handlers of <Linear> and the lists below it: media files, video clicks, tracking events.
-#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 
@@ -76,8 +75,10 @@ unsigned int CVASTParser::LoadSkipOffset(void* node, AdLinear* linear) {
     }
     if (IsPercent(value, length)) {
         // Two characters at most: "100%" reads as 10, "7.5%" as 7.
-        int percent = 0;
-        sscanf(value, "%2d", &percent);
+        long long scanned = 0;
+        const char* cursor = value;
+        ka::ScanDecimal(&cursor, 2, &scanned);
+        const int percent = static_cast<int>(scanned);
         uint64_t share = static_cast<uint64_t>(static_cast<uint32_t>(percent)) * linear->duration;
         linear->skipOffset = static_cast<int64_t>(share / 100);
     } else {
@@ -162,7 +163,8 @@ unsigned int CVASTParser::LoadTrackingAttributes(void* node, AdTracking* trackin
     if (IsPercent(value, length)) {
         // A percentage of the duration, kept as the number written (two characters at most).
         long long percent = 0;
-        sscanf(value, "%2lld", &percent);
+        const char* cursor = value;
+        ka::ScanDecimal(&cursor, 2, &percent);
         tracking->offsetKind = AD_OFFSET_PERCENT;
         tracking->offset = percent;
     } else {

@@ -26,25 +26,19 @@ void CXMLDocument::GetElementText(void* node, char*& field) {
     delete[] field;
     field = nullptr;
 
-    // The module's strings are NUL-terminated; its length is not trusted for the copy.
+    // The module's strings are NUL-terminated; its length is not trusted for the copy. Text
+    // inside a complete CDATA section is kept as written (trimmed, no "&amp;" decoding); a
+    // section that does not close is copied whole.
     const size_t size = strlen(text);
-    char* copy = new (std::nothrow) char[size + 1];
+    size_t begin = 0;
+    size_t count = size;
+    if (isCData) ka::CDataContent(text, size, &begin, &count);
+    char* copy = new (std::nothrow) char[count + 1];
     if (copy == nullptr) return;
-    memcpy(copy, text, size + 1);
+    memcpy(copy, text + begin, count);
+    copy[count] = '\0';
     field = copy;
-
-    if (isCData) {
-        // The content is never longer than the raw section, so it fits over it. Text inside a
-        // CDATA section is kept as written: no "&amp;" decoding.
-        char* scratch = new (std::nothrow) char[size + 1];
-        if (scratch == nullptr) return;
-        if (parse_cdata(scratch, field, static_cast<int>(size + 1)) == KA_OK) {
-            memcpy(field, scratch, strlen(scratch) + 1);
-        }
-        delete[] scratch;
-        return;
-    }
-    unescape_amp(field);
+    if (!isCData) unescape_amp(field);
 }
 
 unsigned int CXMLDocument::IsElementCData(void* node, char** text, int& length) {

@@ -7,12 +7,6 @@
 
 namespace ka {
 
-bool NameIs(const char* name, unsigned int length, const char* literal) {
-    if (name == nullptr) return false;
-    size_t n = strlen(literal);
-    return length == n && memcmp(name, literal, n) == 0;
-}
-
 char* CopyText(const char* text, size_t length) {
     char* copy = new char[length + 1];
     memcpy(copy, text, length);
@@ -42,13 +36,12 @@ bool ReadRawText(CXMLDocument& doc, void* node, char*& field) {
     doc.GetTagValue(node, &text, length);
     if (text == nullptr || length < 1) return false;
     delete[] field;
-    field = CopyText(text, static_cast<size_t>(length));
-    // Only a complete CDATA section gives 0; any other text stays as it was copied.
-    char* scratch = new char[static_cast<size_t>(length) + 1];
-    if (parse_cdata(scratch, field, length + 1) == 0) {
-        memcpy(field, scratch, strlen(scratch) + 1);
-    }
-    delete[] scratch;
+    // Only a complete CDATA section is unwrapped; any other text is copied as it is.
+    const size_t size = strnlen(text, static_cast<size_t>(length));
+    size_t begin = 0;
+    size_t count = size;
+    ka::CDataContent(text, size, &begin, &count);
+    field = CopyText(text + begin, count);
     return true;
 }
 

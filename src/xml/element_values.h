@@ -3,13 +3,20 @@
 #pragma once
 
 #include <cstddef>
+#include <cstring>
+#include <string>
 
 class CXMLDocument;
 
 namespace ka {
 
-// Exact, case-sensitive comparison of a tag name of the given length with a literal.
-bool NameIs(const char* name, unsigned int length, const char* literal);
+// Exact, case-sensitive comparison of a tag name of the given length with a literal. Inline, so
+// that the literal's length is known where it is called: every handler tries several names.
+inline bool NameIs(const char* name, unsigned int length, const char* literal) {
+    if (name == nullptr) return false;
+    const size_t n = std::char_traits<char>::length(literal);
+    return length == n && memcmp(name, literal, n) == 0;
+}
 
 // A new[] copy of the first length characters of text, terminated.
 char* CopyText(const char* text, size_t length);

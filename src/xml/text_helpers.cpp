@@ -1,6 +1,5 @@
 #include "xml/text_helpers.h"
 
-#include <cstdio>
 #include <cstring>
 
 #include "ka/result_codes.h"
@@ -22,27 +21,63 @@ bool IsSpace(char c) {
 
 }  // namespace
 
+namespace ka {
+
+bool CDataContent(const char* text, size_t length, size_t* begin, size_t* count) {
+    // The opening ends in '[' and the closing holds none, so the two never overlap.
+    if (length < kCDataOpenLength + kCDataCloseLength ||
+        memcmp(text, kCDataOpen, kCDataOpenLength) != 0 ||
+        memcmp(text + length - kCDataCloseLength, kCDataClose, kCDataCloseLength) != 0) {
+        return false;
+    }
+    size_t first = kCDataOpenLength;
+    size_t end = length - kCDataCloseLength;
+    while (first < end && IsSpace(text[first])) ++first;
+    while (end > first && IsSpace(text[end - 1])) --end;
+    *begin = first;
+    *count = end - first;
+    return true;
+}
+
+bool ScanDecimal(const char** cursor, int width, long long* value) {
+    const char* p = *cursor;
+    while (IsSpace(*p)) ++p;
+    int left = width;
+    bool negative = false;
+    if (*p == '+' || *p == '-') {
+        negative = *p == '-';
+        ++p;
+        --left;
+    }
+    long long result = 0;
+    int digits = 0;
+    while (left > 0 && *p >= '0' && *p <= '9') {
+        result = result * 10 + (*p - '0');
+        ++p;
+        --left;
+        ++digits;
+    }
+    if (digits == 0) return false;
+    *value = negative ? -result : result;
+    *cursor = p;
+    return true;
+}
+
+}  // namespace ka
+
 unsigned int parse_cdata(char* dst, const char* src, int size) {
     // A destination without room for the terminator cannot be written at all.
     if (src == nullptr || dst == nullptr || size <= 0) return KA_ERR_LOAD_FAILED;
     const size_t room = static_cast<size_t>(size) - 1;
     const size_t length = strlen(src);
 
-    // The opening ends in '[' and the closing holds none, so the two never overlap.
-    const bool isSection = length >= kCDataOpenLength + kCDataCloseLength &&
-                           strncmp(src, kCDataOpen, kCDataOpenLength) == 0 &&
-                           strcmp(src + length - kCDataCloseLength, kCDataClose) == 0;
-    if (!isSection) {
+    size_t begin = 0;
+    size_t content = 0;
+    if (!ka::CDataContent(src, length, &begin, &content)) {
         strncpy(dst, src, room);
         dst[room] = '\0';
         return KA_ERR_LOAD_FAILED;
     }
-
-    size_t begin = kCDataOpenLength;
-    size_t end = length - kCDataCloseLength;
-    while (begin < end && IsSpace(src[begin])) ++begin;
-    while (end > begin && IsSpace(src[end - 1])) --end;
-    const size_t content = end - begin;
     if (content <= room) {
         memcpy(dst, src + begin, content);
         dst[content] = '\0';
@@ -54,37 +89,44 @@ unsigned int parse_cdata(char* dst, const char* src, int size) {
 }
 
 // One pass with a read and a write cursor: the same result as decoding each occurrence in place
-// from left to right, without moving the tail once per occurrence.
+// from left to right, without moving the tail once per occurrence. Most texts hold no "&amp;" at
+// all and are left after one search.
 int unescape_amp(char* text) {
     if (text == nullptr) return 0;
-    const size_t length = strlen(text);
-    if (length < kAmpEntityLength) return 0;
-
-    size_t write = 0;
-    size_t read = 0;
-    while (read < length) {
-        if (text[read] == '&' && length - read >= kAmpEntityLength &&
-            memcmp(text + read, kAmpEntity, kAmpEntityLength) == 0) {
-            text[write++] = '&';
-            read += kAmpEntityLength;
-        } else {
-            text[write++] = text[read++];
-        }
+    char* read = strstr(text, kAmpEntity);
+    if (read == nullptr) return 0;
+    char* write = read;
+    while (read != nullptr) {
+        *write++ = '&';
+        read += kAmpEntityLength;
+        // Everything up to the next entity moves down as one block.
+        char* next = strstr(read, kAmpEntity);
+        const size_t block = next != nullptr ? static_cast<size_t>(next - read) : strlen(read);
+        memmove(write, read, block);
+        write += block;
+        read = next;
     }
-    text[write] = '\0';
+    *write = '\0';
     return 0;
 }
 
 unsigned int string2time(const char* text, int length) {
     if (text == nullptr || length < 1) return 0;
-    int hours = 0;
-    int minutes = 0;
-    int seconds = 0;
-    int milliseconds = 0;
-    sscanf(text, "%02d:%02d:%02d.%03d", &hours, &minutes, &seconds, &milliseconds);
+    // sscanf(text, "%02d:%02d:%02d.%03d") without the cost of the format machinery: each field
+    // is read only when everything before it matched.
+    long long fields[4] = {0, 0, 0, 0};
+    const int widths[4] = {2, 2, 2, 3};
+    const char separators[4] = {':', ':', '.', '\0'};
+    const char* cursor = text;
+    for (int i = 0; i < 4; ++i) {
+        if (!ka::ScanDecimal(&cursor, widths[i], &fields[i])) break;
+        if (separators[i] == '\0' || *cursor != separators[i]) break;
+        ++cursor;
+    }
     // Unsigned arithmetic: wraps like the 32-bit result it is, whatever the signs.
-    return ((static_cast<unsigned int>(hours) * 3600u + static_cast<unsigned int>(minutes) * 60u) +
-            static_cast<unsigned int>(seconds)) *
-               1000u +
-           static_cast<unsigned int>(milliseconds);
+    const unsigned int hours = static_cast<unsigned int>(static_cast<int>(fields[0]));
+    const unsigned int minutes = static_cast<unsigned int>(static_cast<int>(fields[1]));
+    const unsigned int seconds = static_cast<unsigned int>(static_cast<int>(fields[2]));
+    const unsigned int milliseconds = static_cast<unsigned int>(static_cast<int>(fields[3]));
+    return ((hours * 3600u + minutes * 60u) + seconds) * 1000u + milliseconds;
 }

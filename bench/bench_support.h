@@ -1,0 +1,75 @@
+// What the benchmark programs share: the three measured documents, the library reached as a
+// player reaches it (dlopen, kaGetVMAPParserAPI, Open with the modules folder), and the XML
+// module reached directly, for the time and memory of its own load of the same buffer.
+#pragma once
+
+#include <cstddef>
+#include <map>
+#include <string>
+#include <vector>
+
+#include <benchmark/benchmark.h>
+
+#include "ka/vmap_parser_api.h"
+#include "xml/xml_parser_api.h"
+
+namespace bench {
+
+struct Document {
+    std::string name;
+    std::string bytes;
+    bool vastOnly;  // a bare VAST document, processed in VAST-only mode
+};
+
+// The three documents: a 4 KB VAST InLine, a 40 KB VMAP of six inline-VAST breaks, and a 1 MB
+// playlist of 200 breaks generated on first use. Exits the program when a file is missing.
+const std::vector<Document>& Documents();
+
+// The 1 MB playlist: breaks copies of one inline-VAST break, each with its own identifiers.
+std::string MakePlaylist(const std::string& vastDocument, int breaks);
+
+// The parser's table from KA_LIB_PATH; the library stays loaded for the program's lifetime.
+const VMAPParserAPI& Library();
+
+// One opened handle of the library, in VAST-only mode when asked; closed by the destructor.
+class ParserHandle {
+public:
+    explicit ParserHandle(bool vastOnly);
+    ~ParserHandle();
+    ParserHandle(const ParserHandle&) = delete;
+    ParserHandle& operator=(const ParserHandle&) = delete;
+    uint32_t Process(const std::string& document);
+
+private:
+    void* mHandle = nullptr;
+};
+
+// The XML module from KA_MODULES_DIR, loaded directly, with one handle of its own.
+class XmlModule {
+public:
+    XmlModule();
+    ~XmlModule();
+    XmlModule(const XmlModule&) = delete;
+    XmlModule& operator=(const XmlModule&) = delete;
+    unsigned int Load(const std::string& document);
+
+private:
+    void* mLibrary = nullptr;
+    void* mHandle = nullptr;
+    XMLParserAPI mApi{};
+};
+
+// A console reporter that also keeps, per benchmark name, the lowest CPU time per iteration
+// (in ns) and the last value of every counter, so that a summary can be printed after the run.
+class KeepingReporter : public benchmark::ConsoleReporter {
+public:
+    void ReportRuns(const std::vector<Run>& runs) override;
+    double CpuTime(const std::string& name) const;
+    double Counter(const std::string& name, const std::string& counter) const;
+
+private:
+    std::map<std::string, double> mCpuTime;
+    std::map<std::string, std::map<std::string, double>> mCounters;
+};
+
+}  // namespace bench
