@@ -239,7 +239,8 @@ uint32_t ka_download_by_url(char* url, unsigned char** data, uint32_t* size, cha
 
     SourceIOApi api;
     memset(&api, 0, sizeof(api));
-    loader.mEntry(&api);
+    // Called through the entry's own type: the loader keeps it as a generic pointer.
+    reinterpret_cast<KaGetSourceIOAPIFn>(loader.mEntry)(&api);
     // The table is the module's: the operations the loop calls unchecked must be there.
     if (api.SetParam == nullptr || api.GetSourceSize == nullptr || api.Read == nullptr ||
         api.GetParam == nullptr || (api.Init != nullptr && api.Uninit == nullptr) ||

@@ -11,7 +11,9 @@ CVASTParser::CVASTParser()
       mMaxDepth(ka::kMaxWrapperDepth),
       mExtensionParser(nullptr),
       mMergeWrappers(1),
-      mStopFlag(nullptr) {}
+      mStopFlag(nullptr),
+      mFetchesLeft(ka::kMaxWrapperFetches),
+      mFetchBudget(&mFetchesLeft) {}
 
 CVASTParser::~CVASTParser() { CVASTParser::Close(); }
 
@@ -33,6 +35,11 @@ unsigned int CVASTParser::Process(void* buffer, unsigned int size, KA_BOOL merge
                                   KA_BOOL* stopFlag) {
     mMergeWrappers = mergeWrappers;
     mStopFlag = stopFlag;
+    // The caller's own document starts a new chain; a wrapped one spends its top's budget.
+    if (mVastAdData.depth == 0) {
+        mFetchesLeft = ka::kMaxWrapperFetches;
+        mFetchBudget = &mFetchesLeft;
+    }
     // The module takes the size as an int: a larger buffer cannot be loaded.
     if (buffer == nullptr || size > static_cast<unsigned int>(INT_MAX)) return KA_ERR_LOAD_FAILED;
     if (LoadXML(static_cast<char*>(buffer), static_cast<int>(size), ka::kXmlLoadMode) != 0) {

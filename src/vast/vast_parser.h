@@ -99,6 +99,8 @@ public:
     CExtensionParser* mExtensionParser;  // owned; null when none is installed
     KA_BOOL mMergeWrappers;              // merge flag of the last Process, for nested parsers
     KA_BOOL* mStopFlag;                  // stop flag of the last Process; null without one
+    unsigned int mFetchesLeft;           // fetches this parser may still start as a chain's top
+    unsigned int* mFetchBudget;          // the top parser's mFetchesLeft, shared down a chain
 
 private:
     // <Extensions> of an InLine or Wrapper into its extensions field: the Parse result.

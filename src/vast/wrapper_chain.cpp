@@ -68,6 +68,8 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad) {
     // false: the download needs a flag to read.
     KA_BOOL neverStop = 0;
     KA_BOOL* stopFlag = mStopFlag != nullptr ? mStopFlag : &neverStop;
+    if (mFetchBudget == nullptr || *mFetchBudget == 0) return KA_ERR_LOAD_FAILED;
+    --*mFetchBudget;
     unsigned char* buffer = nullptr;
     uint32_t size = 0;
     const uint32_t downloaded =
@@ -83,8 +85,10 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad) {
     // A failed load shows up as a failed Process below.
     nested->InitXMLParser();
     nested->mVastAdData.depth = mVastAdData.depth + 1;
+    nested->mFetchBudget = mFetchBudget;
     // The nested parser reads the document and runs its own wrappers before this returns.
     const unsigned int result = nested->Process(buffer, size, mMergeWrappers, mStopFlag);
+    nested->mFetchBudget = &nested->mFetchesLeft;
     delete[] buffer;
     nested->Close();
     return result;

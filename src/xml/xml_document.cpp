@@ -26,7 +26,8 @@ unsigned int CXMLDocument::InitXMLParser() {
     ka::CopyBounded(mEntryName, sizeof(mEntryName), kEntryName);
 
     if (LoadLib(nullptr) == 0 || mEntry == nullptr) return KA_ERR_MODULE_NOT_LOADED;
-    mEntry(&mXMLAPI);
+    // Called through the entry's own type: the loader keeps it as a generic pointer.
+    reinterpret_cast<KaXMLGetParserAPIFn>(mEntry)(&mXMLAPI);
     if (mXMLAPI.Init == nullptr) return KA_ERR_MODULE_NOT_LOADED;
 
     XMLInitData init = {nullptr, nullptr, this};
