@@ -1,5 +1,7 @@
 #include "bench_support.h"
 
+#include "net/source_io_api.h"
+
 #include <dlfcn.h>
 
 #include <cstdio>
@@ -106,6 +108,17 @@ ParserHandle::~ParserHandle() { Library().Close(mHandle); }
 uint32_t ParserHandle::Process(const std::string& document) {
     return Library().Process(mHandle, const_cast<char*>(document.data()),
                              static_cast<uint32_t>(document.size()));
+}
+
+void AllowLocalFiles(const char* baseDir) {
+    void* module = dlopen(KA_MODULES_DIR "libkaSourceIO.so", RTLD_NOW | RTLD_LOCAL);
+    if (module == nullptr) Fail(std::string("dlopen: ") + dlerror());
+    auto entry = reinterpret_cast<KaGetSourceIOAPIFn>(dlsym(module, "kaGetSourceIOAPI"));
+    static SourceIOApi api = {};
+    if (entry == nullptr || entry(&api) != 0 || api.SetParam == nullptr) Fail("no source-IO table");
+    uint32_t on = 1;
+    api.SetParam(nullptr, ka::kSioAllowFiles, &on);
+    if (baseDir != nullptr) api.SetParam(nullptr, ka::kSioFileBaseDir, const_cast<char*>(baseDir));
 }
 
 XmlModule::XmlModule() {

@@ -31,6 +31,10 @@ std::string MakePlaylist(const std::string& vastDocument, int breaks);
 // The parser's table from KA_LIB_PATH; the library stays loaded for the program's lifetime.
 const VMAPParserAPI& Library();
 
+// As the host does for a local document: the source-IO module instance the library loads (the
+// same file, so the same object) may read local files, relative ones below baseDir when given.
+void AllowLocalFiles(const char* baseDir);
+
 // One opened handle of the library, in VAST-only mode when asked; closed by the destructor.
 class ParserHandle {
 public:

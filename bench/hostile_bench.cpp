@@ -22,6 +22,7 @@
 #include <string>
 #include <vector>
 
+#include "bench_support.h"
 #include "hostile_documents.h"
 #include "ka/vmap_parser_api.h"
 #include "net/source_io_api.h"
@@ -34,48 +35,6 @@ constexpr size_t kSmall = 1 * kMiB;
 constexpr size_t kLarge = 8 * kMiB;
 constexpr double kMaxRatio = 1.5;
 constexpr int kRepetitions = 3;
-
-void* Open(const std::string& path) {
-    void* library = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
-    if (library == nullptr) {
-        fprintf(stderr, "cannot load %s: %s\n", path.c_str(), dlerror());
-        exit(2);
-    }
-    return library;
-}
-
-const VMAPParserAPI& Api() {
-    static const VMAPParserAPI api = [] {
-        VMAPParserAPI table = {};
-        auto get =
-            reinterpret_cast<KaGetVMAPParserAPIFn>(dlsym(Open(KA_LIB_PATH), "kaGetVMAPParserAPI"));
-        if (get == nullptr || get(&table) != 0) exit(2);
-        return table;
-    }();
-    return api;
-}
-
-const XMLParserAPI& XmlApi() {
-    static const XMLParserAPI api = [] {
-        XMLParserAPI table = {};
-        auto entry = reinterpret_cast<KaXMLGetParserAPIFn>(
-            dlsym(Open(std::string(KA_MODULES_DIR) + "libkaXMLParser.so"), "kaXMLGetParserAPI"));
-        if (entry == nullptr || entry(&table) != 0) exit(2);
-        return table;
-    }();
-    return api;
-}
-
-// The wrapper-merge shape names a local file: the source-IO module instance the library loads
-// (the same file, so the same instance) must be allowed to read it, as the host allows it.
-void AllowLocalFiles() {
-    void* module = Open(std::string(KA_MODULES_DIR) + "libkaSourceIO.so");
-    auto entry = reinterpret_cast<KaGetSourceIOAPIFn>(dlsym(module, "kaGetSourceIOAPI"));
-    static SourceIOApi api = {};
-    if (entry == nullptr || entry(&api) != 0 || api.SetParam == nullptr) exit(2);
-    uint32_t on = 1;
-    api.SetParam(nullptr, ka::kSioAllowFiles, &on);
-}
 
 // One document at a time: the benchmarks of one shape and size run one after another.
 const hostile::Document& DocumentOf(const hostile::Shape& shape, size_t bytes) {
@@ -101,42 +60,35 @@ void BM_Process(benchmark::State& state, const hostile::Shape* shape, size_t byt
     std::vector<char> buffer(document.text.begin(), document.text.end());
     std::string workPath = KA_MODULES_DIR;
     void* handle = nullptr;
-    if (Api().Open(&handle, &workPath[0]) != 0) {
+    if (bench::Library().Open(&handle, &workPath[0]) != 0) {
         state.SkipWithError("Open failed");
         return;
     }
     if (shape->mode == hostile::Mode::kVastOnly) {
-        Api().SetParam(handle, KA_PID_VMAP_VAST_ONLY, handle);
+        bench::Library().SetParam(handle, KA_PID_VMAP_VAST_ONLY, handle);
     }
     // Each Process first releases what the one before built, so that cost is in the loop too.
     for (auto _ : state) {
         const uint32_t result =
-            Api().Process(handle, buffer.data(), static_cast<uint32_t>(buffer.size()));
+            bench::Library().Process(handle, buffer.data(), static_cast<uint32_t>(buffer.size()));
         if (result != 0) {
             state.SkipWithError("Process failed");
             break;
         }
     }
-    Api().Close(handle);
+    bench::Library().Close(handle);
     SetCounters(state, document);
 }
 
 void BM_XmlLoad(benchmark::State& state, const hostile::Shape* shape, size_t bytes) {
     const hostile::Document& document = DocumentOf(*shape, bytes);
-    std::vector<char> buffer(document.text.begin(), document.text.end());
-    XMLInitData init = {nullptr, nullptr, nullptr};
-    void* handle = nullptr;
-    if (XmlApi().Init(&handle, &init) != 0) {
-        state.SkipWithError("Init failed");
-        return;
-    }
+    bench::XmlModule module;
     for (auto _ : state) {
-        if (XmlApi().LoadXML(handle, buffer.data(), static_cast<int>(buffer.size()), 160) != 0) {
+        if (module.Load(document.text) != 0) {
             state.SkipWithError("LoadXML failed");
             break;
         }
     }
-    XmlApi().Uninit(handle);
     SetCounters(state, document);
 }
 
@@ -185,7 +137,7 @@ int main(int argc, char** argv) {
         mallopt(M_MMAP_THRESHOLD, 32 * 1024 * 1024);
         mallopt(M_TRIM_THRESHOLD, 1024 * 1024 * 1024);
     }
-    AllowLocalFiles();
+    bench::AllowLocalFiles(nullptr);
     size_t count = 0;
     const hostile::Shape* shapes = hostile::Shapes(&count);
     for (size_t i = 0; i < count; ++i) {

@@ -23,6 +23,7 @@
 #include <string>
 #include <vector>
 
+#include "bench_support.h"
 #include "ka/download.h"
 #include "ka/vmap_parser_api.h"
 #include "net/source_io_api.h"
@@ -40,38 +41,6 @@ struct Example {
     bool vastOnly;
     bool stopDownloads;  // its wrapper URL was rewritten to a closed loopback port
 };
-
-void* Load(const std::string& path) {
-    void* library = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
-    if (library == nullptr) {
-        fprintf(stderr, "cannot load %s: %s\n", path.c_str(), dlerror());
-        exit(2);
-    }
-    return library;
-}
-
-const VMAPParserAPI& Api() {
-    static const VMAPParserAPI api = [] {
-        VMAPParserAPI table = {};
-        auto get =
-            reinterpret_cast<KaGetVMAPParserAPIFn>(dlsym(Load(KA_LIB_PATH), "kaGetVMAPParserAPI"));
-        if (get == nullptr || get(&table) != 0) exit(2);
-        return table;
-    }();
-    return api;
-}
-
-// As kavmap does for a local document: the source-IO module (the same instance the library
-// loads) reads local files, relative references from the chain's folder.
-void AllowFilesBelow(const std::string& dir) {
-    void* module = Load(std::string(KA_MODULES_DIR) + "libkaSourceIO.so");
-    auto entry = reinterpret_cast<KaGetSourceIOAPIFn>(dlsym(module, "kaGetSourceIOAPI"));
-    static SourceIOApi api = {};
-    if (entry == nullptr || entry(&api) != 0 || api.SetParam == nullptr) exit(2);
-    uint32_t on = 1;
-    api.SetParam(nullptr, ka::kSioAllowFiles, &on);
-    api.SetParam(nullptr, ka::kSioFileBaseDir, const_cast<char*>(dir.c_str()));
-}
 
 // Points every http(s) VASTAdTagURI at a closed loopback port; true when one was.
 bool KeepOffTheNetwork(std::string& text) {
@@ -125,8 +94,8 @@ KA_BOOL gStop = 1;
 std::string gWorkPath = KA_MODULES_DIR;
 
 bool Process(void* handle, Example& example) {
-    Api().SetParam(handle, KA_PID_VMAP_STOP_FLAG, example.stopDownloads ? &gStop : nullptr);
-    const uint32_t result = Api().Process(handle, example.text.data(),
+    bench::Library().SetParam(handle, KA_PID_VMAP_STOP_FLAG, example.stopDownloads ? &gStop : nullptr);
+    const uint32_t result = bench::Library().Process(handle, example.text.data(),
                                           static_cast<uint32_t>(example.text.size()));
     if (result != 0) {
         fprintf(stderr, "%s: Process gave 0x%08x\n", example.name.c_str(), result);
@@ -137,11 +106,11 @@ bool Process(void* handle, Example& example) {
 
 void* OpenHandle(bool vastOnly) {
     void* handle = nullptr;
-    if (Api().Open(&handle, &gWorkPath[0]) != 0) {
+    if (bench::Library().Open(&handle, &gWorkPath[0]) != 0) {
         fprintf(stderr, "Open failed\n");
         exit(2);
     }
-    Api().SetParam(handle, KA_PID_VMAP_VAST_ONLY, vastOnly ? handle : nullptr);
+    bench::Library().SetParam(handle, KA_PID_VMAP_VAST_ONLY, vastOnly ? handle : nullptr);
     return handle;
 }
 
@@ -158,7 +127,7 @@ bool FreshCycle(std::vector<Example>& examples) {
     for (Example& example : examples) {
         void* handle = OpenHandle(example.vastOnly);
         const bool ok = Process(handle, example);
-        Api().Close(handle);
+        bench::Library().Close(handle);
         if (!ok) return false;
     }
     return true;
@@ -194,7 +163,7 @@ int main(int argc, char** argv) {
         return 2;
     }
     const std::string examplesDir = KA_EXAMPLES_DIR;
-    AllowFilesBelow(examplesDir + "wrapper-chain/");
+    bench::AllowLocalFiles((examplesDir + "wrapper-chain/").c_str());
     std::vector<Example> examples;
     AddExamples(examplesDir, "", examples);
     AddExamples(examplesDir + "wrapper-chain/", "wrapper-chain/", examples);
@@ -207,7 +176,7 @@ int main(int argc, char** argv) {
         if (!Process(handle, example)) return 1;
         if (example.vastOnly) {
             VastAdData* data = nullptr;
-            Api().GetVastAdData(handle, &data);
+            bench::Library().GetVastAdData(handle, &data);
             const AdData* first = data != nullptr ? data->firstAd : nullptr;
             printf("%-28s VAST: %u ads, the first %s%s\n", example.name.c_str(),
                    data != nullptr ? data->adCount : 0,
@@ -217,15 +186,15 @@ int main(int argc, char** argv) {
                    example.stopDownloads ? " (its fetch kept off the network)" : "");
         } else {
             AdInfo* info = nullptr;
-            Api().GetAdInfo(handle, &info);
+            bench::Library().GetAdInfo(handle, &info);
             printf("%-28s VMAP: %u breaks\n", example.name.c_str(), info->adBreakCount);
         }
     }
     flat = Run("one handle per mode, Process each", cycles,
                [&] { return ReuseCycle(examples, vmap, vast); }) &&
            flat;
-    Api().Close(vmap);
-    Api().Close(vast);
+    bench::Library().Close(vmap);
+    bench::Library().Close(vast);
     flat = Run("Open / Process / Close each", cycles, [&] { return FreshCycle(examples); }) && flat;
     printf("resident set %s (limit %ld KiB of growth)\n", flat ? "flat" : "GROWS", kMaxGrowthKiB);
     return flat ? 0 : 1;
