@@ -19,11 +19,13 @@
 
 #include "ka/result_codes.h"
 #include "net/download.h"
+#include "loopback.h"
 #include "net/source_io_api.h"
 
 namespace {
 
 using Clock = std::chrono::steady_clock;
+using loopback::SetModule;
 
 int64_t MsSince(Clock::time_point from) {
     return std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - from).count();
@@ -40,50 +42,28 @@ const std::string& Document() {
 
 const std::string kLocal = KA_TEST_DATA_DIR "net/local_document.xml";
 
-// An HTTP server on 127.0.0.1; /stall holds its request until the server ends (at most 10 s).
-class LoopbackServer {
+// The test server: /stall holds its request until the server ends (at most 10 s).
+class LoopbackServer : public loopback::Server {
 public:
-    LoopbackServer() {
-        using Req = const httplib::Request&;
-        using Res = httplib::Response&;
-        server_.Get("/doc", [](Req, Res res) { res.set_content(Document(), "text/xml"); });
-        server_.Get("/dir/doc", [](Req, Res res) { res.set_content("in dir", "text/plain"); });
-        server_.Get("/redirect", [](Req, Res res) { res.set_redirect("/doc"); });
-        server_.Get("/to-file", [](Req, Res res) { res.set_redirect("file://" + kLocal); });
-        server_.Get("/agent", [](Req req, Res res) {
-            res.set_content(req.get_header_value("User-Agent"), "text/plain");
-        });
-        server_.Get("/size/(\\d+)", [](Req req, Res res) {
-            res.set_content(std::string(std::stoul(req.matches[1]), 'v'), "text/plain");
-        });
-        server_.Get("/stall", [this](Req, Res res) {
-            const auto start = Clock::now();
-            while (!ending_ && MsSince(start) < 10000) usleep(2000);
-            res.set_content("late", "text/plain");
-        });
-        port_ = server_.bind_to_any_port("127.0.0.1");
-        if (port_ > 0) {
-            thread_ = std::thread([this] { server_.listen_after_bind(); });
-            // stop() only reaches a server that is already running.
-            const auto start = Clock::now();
-            while (!server_.is_running() && MsSince(start) < 5000) usleep(1000);
-        }
-    }
-    ~LoopbackServer() {
-        ending_ = true;
-        server_.stop();
-        if (thread_.joinable()) thread_.join();
-    }
-    bool Running() const { return port_ > 0 && server_.is_running(); }
-    std::string Url(const std::string& path) const {
-        return "http://127.0.0.1:" + std::to_string(port_) + path;
-    }
-
-private:
-    httplib::Server server_;
-    std::thread thread_;
-    int port_ = -1;
-    std::atomic<bool> ending_{false};
+    LoopbackServer()
+        : loopback::Server([](httplib::Server& server, const loopback::Server& self) {
+              using Req = const httplib::Request&;
+              using Res = httplib::Response&;
+              server.Get("/doc", [](Req, Res res) { res.set_content(Document(), "text/xml"); });
+              server.Get("/dir/doc", [](Req, Res res) { res.set_content("in dir", "text/plain"); });
+              server.Get("/redirect", [](Req, Res res) { res.set_redirect("/doc"); });
+              server.Get("/to-file", [](Req, Res res) { res.set_redirect("file://" + kLocal); });
+              server.Get("/agent", [](Req req, Res res) {
+                  res.set_content(req.get_header_value("User-Agent"), "text/plain");
+              });
+              server.Get("/size/(\\d+)", [](Req req, Res res) {
+                  res.set_content(std::string(std::stoul(req.matches[1]), 'v'), "text/plain");
+              });
+              server.Get("/stall", [&self](Req, Res res) {
+                  loopback::Stall(self);
+                  res.set_content("late", "text/plain");
+              });
+          }) {}
 };
 
 struct Fetched {
@@ -169,25 +149,13 @@ SourceIOApi ScriptTable() {
 // every test. The library's own loads of the module reach this same loaded object.
 class DownloadTest : public ::testing::Test {
 protected:
-    static void SetUpTestSuite() {
-        void* module = dlopen(KA_MODULES_DIR "libkaSourceIO.so", RTLD_NOW);
-        ASSERT_NE(nullptr, module) << dlerror();
-        auto entry = reinterpret_cast<KaGetSourceIOAPIFn>(dlsym(module, "kaGetSourceIOAPI"));
-        ASSERT_NE(nullptr, entry);
-        memset(&api_, 0, sizeof(api_));
-        entry(&api_);
-    }
     void SetUp() override {
-        ASSERT_NE(nullptr, api_.SetParam);
         ASSERT_TRUE(server_.Running());
         SetModule(ka::kSioConnectTimeoutMs, 0);
         SetModule(ka::kSioTotalTimeoutMs, 0);
         SetModule(ka::kSioMaxRedirects, ka::kSioDefaultMaxRedirects);
         SetModule(ka::kSioAllowFiles, 0);
         api_.SetParam(nullptr, ka::kSioFileBaseDir, nullptr);
-    }
-    static void SetModule(uint32_t id, uint32_t value) {
-        ASSERT_EQ(0u, api_.SetParam(nullptr, id, &value));
     }
     // ka_download_by_url with the built modules.
     static Fetched Fetch(const std::string& url, KA_BOOL* stop = nullptr,
@@ -202,11 +170,11 @@ protected:
         return r;
     }
 
-    static SourceIOApi api_;
+    static SourceIOApi& api_;
     LoopbackServer server_;
 };
 
-SourceIOApi DownloadTest::api_;
+SourceIOApi& DownloadTest::api_ = loopback::SourceIo();
 
 TEST_F(DownloadTest, DeliversTheExactBytes) {
     KA_BOOL stop = 0;

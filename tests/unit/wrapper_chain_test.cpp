@@ -9,7 +9,6 @@
 #include <unistd.h>
 
 #include <chrono>
-#include <condition_variable>
 #include <cstdio>
 #include <map>
 #include <mutex>
@@ -18,12 +17,14 @@
 #include <vector>
 
 #include "ka/download.h"
+#include "loopback.h"
 #include "net/source_io_api.h"
 #include "vast_test_util.h"
 
 namespace {
 
 using Clock = std::chrono::steady_clock;
+using loopback::SetModule;
 using vasttest::Length;
 using vasttest::Nth;
 using vasttest::Str;
@@ -71,53 +72,36 @@ std::string Vast(const std::string& ads, const std::string& error = "") {
 
 // Serves the documents a test registers under /d/NAME and counts every request by path.
 // /stall requests are held until the server stops or ten seconds pass.
-class LoopbackServer {
+class LoopbackServer : public loopback::Server {
 public:
-    LoopbackServer() {
-        server_.Get("/d/(.*)", [this](const httplib::Request& req, httplib::Response& res) {
-            std::lock_guard<std::mutex> lock(mutex_);
-            counts_[req.path]++;
-            auto found = docs_.find(req.matches[1]);
-            if (found == docs_.end()) {
-                res.status = 404;
-                res.set_content("not here", "text/plain");
-            } else {
-                res.set_content(found->second, "application/xml");
-            }
-        });
-        server_.Get("/stall(/.*)?", [this](const httplib::Request& req, httplib::Response& res) {
-            std::unique_lock<std::mutex> lock(mutex_);
-            counts_[req.path]++;
-            released_.wait_for(lock, std::chrono::seconds(10), [this] { return release_; });
-            res.set_content(Vast(InLineAd("late", "late")), "application/xml");
-        });
-        server_.Get("/size/(\\d+)", [](const httplib::Request& req, httplib::Response& res) {
-            res.set_content(std::string(std::stoul(req.matches[1]), ' '), "application/xml");
-        });
-        port_ = server_.bind_to_any_port("127.0.0.1");
-        if (port_ > 0) {
-            thread_ = std::thread([this] { server_.listen_after_bind(); });
-            const auto deadline = Clock::now() + std::chrono::seconds(5);
-            while (!server_.is_running() && Clock::now() < deadline) {
-                std::this_thread::sleep_for(std::chrono::milliseconds(1));
-            }
-        }
-    }
+    LoopbackServer()
+        : loopback::Server([this](httplib::Server& server, const loopback::Server& self) {
+              using Req = const httplib::Request&;
+              using Res = httplib::Response&;
+              server.Get("/d/(.*)", [this](Req req, Res res) {
+                  std::lock_guard<std::mutex> lock(mutex_);
+                  counts_[req.path]++;
+                  auto found = docs_.find(req.matches[1]);
+                  if (found == docs_.end()) {
+                      res.status = 404;
+                      res.set_content("not here", "text/plain");
+                  } else {
+                      res.set_content(found->second, "application/xml");
+                  }
+              });
+              server.Get("/stall(/.*)?", [this, &self](Req req, Res res) {
+                  {
+                      std::lock_guard<std::mutex> lock(mutex_);
+                      counts_[req.path]++;
+                  }
+                  loopback::Stall(self);
+                  res.set_content(Vast(InLineAd("late", "late")), "application/xml");
+              });
+              server.Get("/size/(\\d+)", [](Req req, Res res) {
+                  res.set_content(std::string(std::stoul(req.matches[1]), ' '), "application/xml");
+              });
+          }) {}
 
-    ~LoopbackServer() {
-        {
-            std::lock_guard<std::mutex> lock(mutex_);
-            release_ = true;
-        }
-        released_.notify_all();
-        server_.stop();
-        if (thread_.joinable()) thread_.join();
-    }
-
-    bool Running() const { return port_ > 0 && server_.is_running(); }
-    std::string Url(const std::string& path) const {
-        return "http://127.0.0.1:" + std::to_string(port_) + path;
-    }
     // Registers a document; returns its URL.
     std::string Put(const std::string& name, const std::string& body) {
         std::lock_guard<std::mutex> lock(mutex_);
@@ -136,12 +120,7 @@ public:
     }
 
 private:
-    httplib::Server server_;
-    std::thread thread_;
-    int port_ = -1;
     std::mutex mutex_;
-    std::condition_variable released_;
-    bool release_ = false;
     std::map<std::string, std::string> docs_;
     std::map<std::string, int> counts_;
 };
@@ -165,19 +144,7 @@ int ClosedPort() {
 // The parser fixture with the default depth limit: wrapped documents are fetched.
 class WrapperChainTest : public vasttest::VastParserTest {
 protected:
-    static void SetUpTestSuite() {
-        // The same loaded object the library reaches: its module-wide settings apply to the
-        // downloads of the chain.
-        module_ = dlopen(KA_MODULES_DIR "libkaSourceIO.so", RTLD_NOW);
-        ASSERT_NE(nullptr, module_) << dlerror();
-        auto entry = reinterpret_cast<KaGetSourceIOAPIFn>(dlsym(module_, "kaGetSourceIOAPI"));
-        ASSERT_NE(nullptr, entry);
-        memset(&api_, 0, sizeof(api_));
-        entry(&api_);
-    }
-
     void SetUp() override {
-        ASSERT_NE(nullptr, api_.SetParam);
         ASSERT_TRUE(server_.Running());
         SetModule(ka::kSioConnectTimeoutMs, 0);
         SetModule(ka::kSioTotalTimeoutMs, 0);
@@ -189,10 +156,6 @@ protected:
     void TearDown() override {
         VastParserTest::TearDown();
         SetModule(ka::kSioTotalTimeoutMs, 0);
-    }
-
-    static void SetModule(uint32_t id, uint32_t value) {
-        ASSERT_EQ(0u, api_.SetParam(nullptr, id, &value));
     }
 
     // Process on the caller's document (depth 0); the counts are checked afterwards.
@@ -227,14 +190,10 @@ protected:
         EXPECT_EQ(nullptr, wrapper->nestedParser);
     }
 
-    static void* module_;
-    static SourceIOApi api_;
     LoopbackServer server_;
     std::string mBuffer;
 };
 
-void* WrapperChainTest::module_ = nullptr;
-SourceIOApi WrapperChainTest::api_;
 
 // ---- Merging ----------------------------------------------------------------------------------
 
