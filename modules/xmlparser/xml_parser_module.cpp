@@ -2,9 +2,9 @@
 // "xml/xml_parser_api.h" over pugixml.
 //
 // What the module promises, and how:
-// - A node is the pugixml node record itself (xml_node::internal_object()), so a node from one
-//   handle's document works with the operations of any other handle of this module; node
-//   queries never look at the handle's own document.
+// - A node is the module's record of an element (element_index.h), so a node from one handle's
+//   document works with the operations of any other handle of this module; node queries never
+//   look at the handle's own document. Names, texts and attributes are measured once, at load.
 // - Children are elements only: the walks skip every other kind of node.
 // - Names, attribute values and texts are raw, exactly as written in the buffer: no entity or
 //   character reference is decoded, no line ending or attribute white space is normalised.
@@ -22,17 +22,23 @@
 //   expanded or fetched, and nothing outside the buffer is read.
 // - Parsing is linear in the buffer's size and never recurses by document depth, and neither
 //   does the pass over the loaded tree.
-// - GetNextAttribute walks an element's attributes; SetParam, GetParam and slot 12 do nothing
+// - GetNextAttribute walks an element's attributes; an attribute that is not the node's own
+//   ends the walk. SetParam, GetParam and slot 12 do nothing
 //   and answer kErrUnsupported.
 #include <cstddef>
+#include <cstdint>
 #include <cstring>
 #include <new>
 #include <pugixml.hpp>
 
+#include "element_index.h"
 #include "ka/result_codes.h"
 #include "xml/xml_parser_api.h"
 
 namespace {
+
+using xmlmodule::Attribute;
+using xmlmodule::Element;
 
 // Module-private: SetParam, GetParam and slot 12 know no identifiers or requests.
 constexpr unsigned int kErrUnsupported = 0x91001001u;
@@ -42,107 +48,17 @@ constexpr unsigned int kErrUnsupported = 0x91001001u;
 // stay raw; fragment mode keeps text at the top level visible, so that it can be refused too.
 constexpr unsigned int kParseFlags = pugi::parse_cdata | pugi::parse_doctype | pugi::parse_fragment;
 
-constexpr char kCDataOpen[] = "![CDATA[";
-constexpr size_t kCDataOpenLength = sizeof(kCDataOpen) - 1;
-constexpr char kCDataClose[] = "]]";
-constexpr size_t kCDataCloseLength = sizeof(kCDataClose) - 1;
-
 struct ParserHandle {
     pugi::xml_document document;
-    // Where trimmed texts and CDATA forms are assembled before they go into the document.
-    char* scratch = nullptr;
-    size_t scratchSize = 0;
-
-    ~ParserHandle() { delete[] scratch; }
+    xmlmodule::ElementIndex index;
+    Element* root = nullptr;  // null while no document is loaded
 };
 
 ParserHandle* AsHandle(void* handle) { return static_cast<ParserHandle*>(handle); }
 
-pugi::xml_node AsNode(void* node) {
-    return pugi::xml_node(static_cast<pugi::xml_node_struct*>(node));
-}
+const Element* AsElement(void* node) { return static_cast<const Element*>(node); }
 
-bool IsSpace(char c) {
-    return c == ' ' || c == '\t' || c == '\n' || c == '\v' || c == '\f' || c == '\r';
-}
-
-bool IsText(const pugi::xml_node& node) {
-    return node.type() == pugi::node_pcdata || node.type() == pugi::node_cdata;
-}
-
-bool EnsureScratch(ParserHandle* handle, size_t size) {
-    if (handle->scratchSize >= size) return true;
-    char* grown = new (std::nothrow) char[size];
-    if (grown == nullptr) return false;
-    delete[] handle->scratch;
-    handle->scratch = grown;
-    handle->scratchSize = size;
-    return true;
-}
-
-// A text node keeps its trimmed value. pugixml may write the new value over the old one, so the
-// trimmed text goes through the scratch buffer rather than straight from the value itself.
-bool TrimText(ParserHandle* handle, pugi::xml_node node) {
-    const char* value = node.value();
-    size_t length = strlen(value);
-    size_t begin = 0;
-    while (begin < length && IsSpace(value[begin])) ++begin;
-    size_t end = length;
-    while (end > begin && IsSpace(value[end - 1])) --end;
-    if (begin == 0 && end == length) return true;
-    if (!EnsureScratch(handle, end - begin + 1)) return false;
-    memcpy(handle->scratch, value + begin, end - begin);
-    return node.set_value(handle->scratch, end - begin);
-}
-
-// A CDATA node's value becomes the section as the library reads it: "![CDATA[" content "]]".
-bool WrapCData(ParserHandle* handle, pugi::xml_node node) {
-    const char* value = node.value();
-    size_t length = strlen(value);
-    size_t total = kCDataOpenLength + length + kCDataCloseLength;
-    if (!EnsureScratch(handle, total)) return false;
-    memcpy(handle->scratch, kCDataOpen, kCDataOpenLength);
-    memcpy(handle->scratch + kCDataOpenLength, value, length);
-    memcpy(handle->scratch + kCDataOpenLength + length, kCDataClose, kCDataCloseLength);
-    return node.set_value(handle->scratch, total);
-}
-
-// The top level must hold exactly one element and no text, CDATA or DOCTYPE.
-bool HasSingleRoot(const pugi::xml_document& document) {
-    int elements = 0;
-    for (pugi::xml_node node = document.first_child(); node; node = node.next_sibling()) {
-        if (node.type() != pugi::node_element) return false;
-        ++elements;
-    }
-    return elements == 1;
-}
-
-// Visits every node in document order with a cursor (no recursion) and puts each text and
-// CDATA value into the form GetTagValue hands out.
-bool PrepareTexts(ParserHandle* handle) {
-    pugi::xml_node root = handle->document;
-    pugi::xml_node cursor = root.first_child();
-    while (cursor) {
-        if (cursor.type() == pugi::node_pcdata && !TrimText(handle, cursor)) return false;
-        if (cursor.type() == pugi::node_cdata && !WrapCData(handle, cursor)) return false;
-
-        pugi::xml_node next = cursor.first_child();
-        while (!next && cursor) {
-            next = cursor.next_sibling();
-            if (!next) {
-                cursor = cursor.parent();
-                if (cursor == root) cursor = pugi::xml_node();
-            }
-        }
-        cursor = next;
-    }
-    return true;
-}
-
-pugi::xml_node FirstElement(pugi::xml_node node) {
-    while (node && node.type() != pugi::node_element) node = node.next_sibling();
-    return node;
-}
+void* AsNode(const Element* element) { return const_cast<Element*>(element); }
 
 void ClearNode(void** out) {
     if (out != nullptr) *out = nullptr;
@@ -153,9 +69,14 @@ void ClearString(char** text, int* length) {
     if (length != nullptr) *length = 0;
 }
 
-void SetString(const char* value, char** text, int* length) {
+void SetString(const char* value, int valueLength, char** text, int* length) {
     *text = const_cast<char*>(value);
-    *length = static_cast<int>(strlen(value));
+    *length = valueLength;
+}
+
+bool SameName(const char* name, int nameLength, const char* wanted, size_t wantedLength) {
+    return static_cast<size_t>(nameLength) == wantedLength &&
+           memcmp(name, wanted, wantedLength) == 0;
 }
 
 unsigned int Init(void** handle, XMLInitData* /*init*/) {
@@ -175,6 +96,7 @@ unsigned int Uninit(void* handle) {
 unsigned int LoadXML(void* handle, char* buffer, int size, int /*mode*/) {
     if (handle == nullptr) return KA_ERR_NULL_ARGUMENT;
     ParserHandle* parser = AsHandle(handle);
+    parser->root = nullptr;
     parser->document.reset();
     if (buffer == nullptr || size <= 0) return KA_ERR_LOAD_FAILED;
 
@@ -186,7 +108,8 @@ unsigned int LoadXML(void* handle, char* buffer, int size, int /*mode*/) {
 
     pugi::xml_parse_result result =
         parser->document.load_buffer(buffer, length, kParseFlags, pugi::encoding_utf8);
-    if (!result || !HasSingleRoot(parser->document) || !PrepareTexts(parser)) {
+    if (result) parser->root = parser->index.Build(parser->document, length);
+    if (parser->root == nullptr) {
         parser->document.reset();
         return KA_ERR_LOAD_FAILED;
     }
@@ -196,16 +119,14 @@ unsigned int LoadXML(void* handle, char* buffer, int size, int /*mode*/) {
 unsigned int GetFirstChild(void* handle, void* node, void** child) {
     ClearNode(child);
     if (handle == nullptr || child == nullptr) return KA_ERR_NULL_ARGUMENT;
-    pugi::xml_node found = node == nullptr ? AsHandle(handle)->document.document_element()
-                                           : FirstElement(AsNode(node).first_child());
-    *child = found.internal_object();
+    *child = AsNode(node == nullptr ? AsHandle(handle)->root : AsElement(node)->firstChild);
     return KA_OK;
 }
 
 unsigned int GetNextSibling(void* handle, void* node, void** sibling) {
     ClearNode(sibling);
     if (handle == nullptr || node == nullptr || sibling == nullptr) return KA_ERR_NULL_ARGUMENT;
-    *sibling = FirstElement(AsNode(node).next_sibling()).internal_object();
+    *sibling = AsNode(AsElement(node)->nextSibling);
     return KA_OK;
 }
 
@@ -214,10 +135,10 @@ unsigned int GetChildByName(void* handle, void* node, char* name, void** child) 
     if (handle == nullptr || node == nullptr || name == nullptr || child == nullptr) {
         return KA_ERR_NULL_ARGUMENT;
     }
-    for (pugi::xml_node it = FirstElement(AsNode(node).first_child()); it;
-         it = FirstElement(it.next_sibling())) {
-        if (strcmp(it.name(), name) == 0) {
-            *child = it.internal_object();
+    const size_t wanted = strlen(name);
+    for (const Element* it = AsElement(node)->firstChild; it != nullptr; it = it->nextSibling) {
+        if (SameName(it->name, it->nameLength, name, wanted)) {
+            *child = AsNode(it);
             break;
         }
     }
@@ -230,13 +151,13 @@ unsigned int GetAttributeValue(void* handle, void* node, char* name, char** valu
         length == nullptr) {
         return KA_ERR_NULL_ARGUMENT;
     }
-    // Duplicate attributes are not refused; the first one is the one read. The first byte is
-    // compared before the whole name: the library asks for many names that are absent.
-    for (pugi::xml_attribute attribute = AsNode(node).first_attribute(); attribute;
-         attribute = attribute.next_attribute()) {
-        const char* candidate = attribute.name();
-        if (candidate[0] == name[0] && strcmp(candidate, name) == 0) {
-            SetString(attribute.value(), value, length);
+    // Duplicate attributes are not refused; the first one is the one read.
+    const Element* element = AsElement(node);
+    const size_t wanted = strlen(name);
+    for (int i = 0; i < element->attributeCount; ++i) {
+        const Attribute& attribute = element->attributes[i];
+        if (SameName(attribute.name, attribute.nameLength, name, wanted)) {
+            SetString(attribute.value, attribute.valueLength, value, length);
             break;
         }
     }
@@ -254,14 +175,22 @@ unsigned int GetNextAttribute(void* handle, void* node, void** next, void* curre
         nameLength == nullptr || value == nullptr || valueLength == nullptr) {
         return KA_ERR_NULL_ARGUMENT;
     }
-    pugi::xml_attribute attribute =
-        current == nullptr ? AsNode(node).first_attribute()
-                           : pugi::xml_attribute(static_cast<pugi::xml_attribute_struct*>(current))
-                                 .next_attribute();
-    if (attribute) {
-        *next = attribute.internal_object();
-        SetString(attribute.name(), name, nameLength);
-        SetString(attribute.value(), value, valueLength);
+    const Element* element = AsElement(node);
+    int index = 0;
+    if (current != nullptr) {
+        // Compared as addresses, so that a stranger's pointer is recognised without arithmetic
+        // on it.
+        const uintptr_t first = reinterpret_cast<uintptr_t>(element->attributes);
+        const uintptr_t at = reinterpret_cast<uintptr_t>(current);
+        const uintptr_t end = first + sizeof(Attribute) * static_cast<size_t>(element->attributeCount);
+        if (at < first || at >= end || (at - first) % sizeof(Attribute) != 0) return KA_OK;
+        index = static_cast<int>((at - first) / sizeof(Attribute)) + 1;
+    }
+    if (index < element->attributeCount) {
+        const Attribute& attribute = element->attributes[index];
+        *next = const_cast<Attribute*>(&attribute);
+        SetString(attribute.name, attribute.nameLength, name, nameLength);
+        SetString(attribute.value, attribute.valueLength, value, valueLength);
     }
     return KA_OK;
 }
@@ -271,13 +200,8 @@ unsigned int GetTagValue(void* handle, void* node, char** text, int* length) {
     if (handle == nullptr || node == nullptr || text == nullptr || length == nullptr) {
         return KA_ERR_NULL_ARGUMENT;
     }
-    // A text of nothing but white space is no text: the search goes on past it.
-    for (pugi::xml_node it = AsNode(node).first_child(); it; it = it.next_sibling()) {
-        if (IsText(it) && it.value()[0] != '\0') {
-            SetString(it.value(), text, length);
-            break;
-        }
-    }
+    const Element* element = AsElement(node);
+    if (element->text != nullptr) SetString(element->text, element->textLength, text, length);
     return KA_OK;
 }
 
@@ -286,7 +210,8 @@ unsigned int GetTagName(void* handle, void* node, char** name, int* length) {
     if (handle == nullptr || node == nullptr || name == nullptr || length == nullptr) {
         return KA_ERR_NULL_ARGUMENT;
     }
-    SetString(AsNode(node).name(), name, length);
+    const Element* element = AsElement(node);
+    SetString(element->name, element->nameLength, name, length);
     return KA_OK;
 }
 

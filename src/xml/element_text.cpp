@@ -38,7 +38,8 @@ void CXMLDocument::GetElementText(void* node, char*& field) {
     memcpy(copy, text + begin, count);
     copy[count] = '\0';
     field = copy;
-    if (!isCData) unescape_amp(field);
+    // Most texts hold no '&' at all; they are not searched for "&amp;" a second time.
+    if (!isCData && memchr(copy, '&', count) != nullptr) unescape_amp(field);
 }
 
 unsigned int CXMLDocument::IsElementCData(void* node, char** text, int& length) {

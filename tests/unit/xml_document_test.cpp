@@ -412,6 +412,110 @@ TEST_F(XmlDocumentTest, NodesAndStringsHoldAcrossLookupsAndOtherHandles) {
     EXPECT_EQ(Name(reader, Root(reader)), "other");
 }
 
+// Attributes in document order, the first of duplicates read by lookup, raw as written; a
+// walk handed an attribute of another element (or any other pointer) ends.
+TEST_F(XmlDocumentTest, AttributesWalkInDocumentOrder) {
+    CXMLDocument& document = OpenDocument();
+    ASSERT_EQ(Load(document, "<a x='1' y=\"&amp;\" x='2' e=''><b z='3'/></a>"), KA_OK);
+    void* a = Root(document);
+    void* b = ChildByName(document, a, "b");
+    auto walk = [&](void* node, void* start) {
+        std::vector<std::string> seen;
+        void* current = start;
+        for (int guard = 0; guard < 10; ++guard) {
+            void* next = kSentinel;
+            char* name = gUntouched;
+            char* value = gUntouched;
+            int nameLength = kLengthSentinel;
+            int valueLength = kLengthSentinel;
+            EXPECT_EQ(document.GetNextAttribute(node, &next, current, &name, nameLength, &value,
+                                                valueLength),
+                      KA_OK);
+            if (next == nullptr) {
+                EXPECT_EQ(Shown(name, nameLength) + Shown(value, valueLength),
+                          std::string(kNull) + kNull);
+                break;
+            }
+            seen.push_back(Shown(name, nameLength) + "=" + Shown(value, valueLength));
+            current = next;
+        }
+        return seen;
+    };
+    EXPECT_EQ(walk(a, nullptr), (std::vector<std::string>{"x=1", "y=&amp;", "x=2", "e="}));
+    EXPECT_EQ(walk(b, nullptr), (std::vector<std::string>{"z=3"}));
+    EXPECT_EQ(Attribute(document, a, "x"), "1");
+    EXPECT_EQ(Attribute(document, a, "e"), "");
+
+    void* fromB = nullptr;
+    char* name = nullptr;
+    char* value = nullptr;
+    int nameLength = 0;
+    int valueLength = 0;
+    document.GetNextAttribute(b, &fromB, nullptr, &name, nameLength, &value, valueLength);
+    ASSERT_NE(fromB, nullptr);
+    EXPECT_TRUE(walk(a, fromB).empty());
+    EXPECT_TRUE(walk(a, kSentinel).empty());
+    EXPECT_TRUE(walk(a, static_cast<char*>(fromB) + 1).empty());
+}
+
+// A handle reuses its memory from load to load: documents that grow and shrink read back whole,
+// with wide elements and deep nesting alike.
+TEST_F(XmlDocumentTest, DocumentsOfChangingSizeReadBackWhole) {
+    auto wide = [](int children, int attributes) {
+        std::string xml = "<root>";
+        for (int i = 0; i < children; ++i) {
+            xml += "<c" + std::to_string(i);
+            for (int j = 0; j < attributes; ++j) {
+                xml += " a" + std::to_string(j) + "='" + std::to_string(i * 1000 + j) + "'";
+            }
+            xml += "> t" + std::to_string(i) + " </c" + std::to_string(i) + ">";
+        }
+        return xml + "</root>";
+    };
+    auto deep = [](int depth) {
+        std::string xml;
+        for (int i = 0; i < depth; ++i) xml += "<d>";
+        xml += "<![CDATA[bottom]]>";
+        for (int i = 0; i < depth; ++i) xml += "</d>";
+        return xml;
+    };
+    struct {
+        std::string xml;
+        int children;
+        int attributes;  // 0 for the deep document
+    } const cases[] = {
+        {wide(3, 2), 3, 2},       {wide(2000, 3), 2000, 3}, {wide(1, 5000), 1, 5000},
+        {wide(10, 1), 10, 1},     {deep(50000), 0, 0},      {wide(2000, 3), 2000, 3},
+    };
+    CXMLDocument& document = OpenDocument();
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.xml.substr(0, 40));
+        ASSERT_EQ(Load(document, c.xml), KA_OK);
+        void* node = Root(document);
+        if (c.attributes == 0) {
+            int depth = 0;
+            for (void* child = node; child != nullptr; ++depth) {
+                node = child;
+                child = nullptr;
+                document.GetFirstChild(node, &child);
+            }
+            EXPECT_EQ(depth, 50000);
+            EXPECT_EQ(Text(document, node), "![CDATA[bottom]]");
+            continue;
+        }
+        std::vector<void*> children = Children(document, node);
+        ASSERT_EQ(static_cast<int>(children.size()), c.children);
+        for (int i = 0; i < c.children; i += c.children > 100 ? 97 : 1) {
+            EXPECT_EQ(Name(document, children[i]), "c" + std::to_string(i));
+            EXPECT_EQ(Text(document, children[i]), "t" + std::to_string(i));
+            for (int j = 0; j < c.attributes; j += c.attributes > 100 ? 499 : 1) {
+                EXPECT_EQ(Attribute(document, children[i], "a" + std::to_string(j)),
+                          std::to_string(i * 1000 + j));
+            }
+        }
+    }
+}
+
 TEST_F(XmlDocumentTest, NullOrOutOfRangeArgumentsFailWithNullOutputs) {
     CXMLDocument& document = OpenDocument();
     char buffer[] = "<a b='1'><c/></a>";
