@@ -74,9 +74,11 @@ void SetString(const char* value, int valueLength, char** text, int* length) {
     *length = valueLength;
 }
 
+// Names of one length often differ in their first character ("width", "codec"): that is
+// looked at before memcmp is called.
 bool SameName(const char* name, int nameLength, const char* wanted, size_t wantedLength) {
     return static_cast<size_t>(nameLength) == wantedLength &&
-           memcmp(name, wanted, wantedLength) == 0;
+           (wantedLength == 0 || name[0] == wanted[0]) && memcmp(name, wanted, wantedLength) == 0;
 }
 
 unsigned int Init(void** handle, XMLInitData* /*init*/) {

@@ -11,7 +11,9 @@ namespace {
 constexpr char kCDataOpen[] = "![CDATA[";
 constexpr size_t kCDataOpenLength = sizeof(kCDataOpen) - 1;
 
-bool IsCDataSection(const char* text) { return strncmp(text, kCDataOpen, kCDataOpenLength) == 0; }
+bool IsCDataSection(const char* text) {
+    return text[0] == kCDataOpen[0] && strncmp(text, kCDataOpen, kCDataOpenLength) == 0;
+}
 
 }  // namespace
 
