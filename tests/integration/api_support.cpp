@@ -108,4 +108,9 @@ AdBreak* BreakById(const AdInfo* info, const char* id) {
     return nullptr;
 }
 
+std::string WrapperTo(const std::string& uri) {
+    return "<VAST><Ad id=\"outer\"><Wrapper><VASTAdTagURI>" + uri +
+           "</VASTAdTagURI></Wrapper></Ad></VAST>";
+}
+
 }  // namespace katest

@@ -1,5 +1,5 @@
 // The public table itself: entries, null handles, Open against missing modules, failed and
-// repeated Process calls, parameters, and documents shaped to hurt.
+// repeated Process calls, parameters, and deep nesting. Long lists are the hostile documents'.
 #include <gtest/gtest.h>
 #include <stdlib.h>
 #include <unistd.h>
@@ -73,20 +73,16 @@ protected:
     Handle handle;
 };
 
-TEST_F(ApiHandle, FreshHandleIsEmpty) {
-    AdInfo* info = handle.Info();
-    ASSERT_NE(info, nullptr);
-    EXPECT_EQ(info->adBreakCount, 0u);
-    EXPECT_EQ(info->adBreaks, nullptr);
-    EXPECT_EQ(Api().GetAdInfo(handle.get(), nullptr), KA_OK);
+TEST_F(ApiHandle, FreshHandleIsEmptyAndParametersByIdentifier) {
+    void* h = handle.get();
+    ASSERT_NE(handle.Info(), nullptr);
+    EXPECT_EQ(handle.Info()->adBreakCount, 0u);
+    EXPECT_EQ(handle.Info()->adBreaks, nullptr);
+    EXPECT_EQ(Api().GetAdInfo(h, nullptr), KA_OK);
     EXPECT_EQ(handle.Container(), kUntouched);
     char* uri = static_cast<char*>(kUntouched);
-    EXPECT_EQ(Api().GetParam(handle.get(), KA_PID_VMAP_CONTENT_URI, &uri), KA_OK);
+    EXPECT_EQ(Api().GetParam(h, KA_PID_VMAP_CONTENT_URI, &uri), KA_OK);
     EXPECT_EQ(uri, nullptr);
-}
-
-TEST_F(ApiHandle, ParametersByIdentifier) {
-    void* h = handle.get();
     KA_BOOL stop = 0;
     // Each SetParam in turn, then what GetParam(VAST_ONLY) reads back.
     const struct {
@@ -187,30 +183,6 @@ TEST_F(ApiHandle, DeepNestingDoesNotRecurse) {
     ASSERT_EQ(handle.Info()->adBreakCount, 1u);
     ASSERT_NE(handle.Info()->adBreaks->adSource, nullptr);
     EXPECT_EQ(handle.Info()->adBreaks->trackings, nullptr) << "TrackingEvents is below the source";
-}
-
-TEST_F(ApiHandle, LongListsKeepDocumentOrder) {
-    const int kCount = 20000;  // breaks, and trackings of the first break
-    std::string breaks, trackings;
-    for (int i = 0; i < kCount; ++i) {
-        trackings += "<vmap:Tracking event=\"" + std::to_string(i) + "\"/>";
-        if (i > 0) breaks += "<vmap:AdBreak breakId=\"" + std::to_string(i) + "\"/>";
-    }
-    ASSERT_EQ(
-        handle.Process("<vmap:VMAP><vmap:AdBreak breakId=\"0\"><vmap:TrackingEvents>" + trackings +
-                       "</vmap:TrackingEvents></vmap:AdBreak>" + breaks + "</vmap:VMAP>"),
-        KA_OK);
-    ASSERT_EQ(handle.Info()->adBreakCount, static_cast<uint32_t>(kCount));
-    int i = 0;
-    for (const AdBreak* b = handle.Info()->adBreaks; b != nullptr; b = b->next, ++i) {
-        ASSERT_EQ(std::to_string(i), b->breakId);
-    }
-    EXPECT_EQ(i, kCount);
-    i = 0;
-    for (auto* t = handle.Info()->adBreaks->trackings; t != nullptr; t = t->next, ++i) {
-        ASSERT_EQ(std::to_string(i), t->event);
-    }
-    EXPECT_EQ(i, kCount);
 }
 
 }  // namespace

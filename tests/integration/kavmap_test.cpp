@@ -144,11 +144,12 @@ TEST(Kavmap, FailuresExitNonZeroWithOneLine) {
     }
 }
 
+// One response from a loopback port; the local file the fetched wrapper names must not be read.
 TEST(Kavmap, UrlDocumentIsFetchedWithoutFileAccess) {
-    // One response from a loopback port; a file named by the fetched document must not be read.
-    const std::string body = "<VAST><Ad id=\"outer\"><Wrapper><VASTAdTagURI>" +
-                             std::string(KA_TEST_DATA_DIR) +
-                             "handoff/wrapped_inline.xml</VASTAdTagURI></Wrapper></Ad></VAST>";
+    const std::string body = katest::WrapperTo();
+    const std::string response =
+        "HTTP/1.1 200 OK\r\nContent-Length: " + std::to_string(body.size()) +
+        "\r\nConnection: close\r\n\r\n" + body;
     const int listener = socket(AF_INET, SOCK_STREAM, 0);
     sockaddr_in address = {};
     address.sin_family = AF_INET;
@@ -157,26 +158,22 @@ TEST(Kavmap, UrlDocumentIsFetchedWithoutFileAccess) {
     ASSERT_EQ(bind(listener, reinterpret_cast<sockaddr*>(&address), length), 0);
     ASSERT_EQ(listen(listener, 1), 0);
     ASSERT_EQ(getsockname(listener, reinterpret_cast<sockaddr*>(&address), &length), 0);
-    std::thread server([listener, &body] {
+    std::thread server([listener, &response] {
         pollfd waiting = {listener, POLLIN, 0};
         const int client = poll(&waiting, 1, 10000) == 1 ? accept(listener, nullptr, nullptr) : -1;
         if (client < 0) return;
+        // The whole request is read first: closing on unread bytes would reset the connection.
         std::string request;
         char chunk[1024];
         pollfd readable = {client, POLLIN, 0};
-        while (request.find("\r\n\r\n") == std::string::npos && poll(&readable, 1, 5000) == 1) {
-            const ssize_t n = read(client, chunk, sizeof(chunk));
-            if (n <= 0) break;
-            request.append(chunk, static_cast<size_t>(n));
+        ssize_t n = 1;
+        while (n > 0 && request.find("\r\n\r\n") == std::string::npos &&
+               poll(&readable, 1, 5000) == 1) {
+            n = read(client, chunk, sizeof(chunk));
+            if (n > 0) request.append(chunk, static_cast<size_t>(n));
         }
-        const std::string response =
-            "HTTP/1.1 200 OK\r\nContent-Length: " + std::to_string(body.size()) +
-            "\r\nConnection: close\r\n\r\n" + body;
-        for (size_t sent = 0; sent < response.size();) {
-            const ssize_t n = write(client, response.data() + sent, response.size() - sent);
-            if (n <= 0) break;
-            sent += static_cast<size_t>(n);
-        }
+        EXPECT_EQ(send(client, response.data(), response.size(), MSG_NOSIGNAL),
+                  static_cast<ssize_t>(response.size()));
         close(client);
     });
     const RunResult run =

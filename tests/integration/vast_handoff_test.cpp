@@ -1,8 +1,10 @@
-// VAST documents inline in VMAP ad sources, read through the public table over the real
-// modules: the block each source owns, the linear durations summed on the break, the handle's
-// container, and releases across Processes and mode switches (run under ASan/LSan as well).
+// VAST through the public table over the real modules: documents inline in VMAP ad sources (the
+// block each source owns, the linear durations summed on the break, the handle's container) and
+// bare documents in VAST-only mode, wrappers merged or kept, and releases across Processes and
+// mode switches (run under ASan/LSan as well).
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <string>
 
 #include "api_support.h"
@@ -49,6 +51,7 @@ protected:
         document = katest::ReadTestData("handoff/inline_breaks.xml");
         ASSERT_FALSE(document.empty());
     }
+    void TearDown() override { katest::AllowLocalFiles(false); }
 
     Handle handle;
     std::vector<char> document;
@@ -173,10 +176,14 @@ TEST_F(VastHandoff, ModeSwitchesReleaseExactlyWhatWasBuilt) {
             ASSERT_EQ(other.Process(vastOnly ? vast : document), KA_OK);
             VastAdData* container = other.Container();
             ASSERT_NE(container, kUntouched);
-            if (vastOnly) {
+            if (vastOnly) {  // the VAST parser's own container, and no VMAP records
                 EXPECT_EQ(other.Info()->adBreakCount, 0u);
+                EXPECT_EQ(other.Info()->adBreaks, nullptr);
                 EXPECT_EQ(other.ContentUri(), nullptr);
+                EXPECT_EQ(container->adCount, 1u);
+                EXPECT_EQ(container->depth, 0u);
                 EXPECT_STREQ(container->firstAd->id, "spring-sale");
+                EXPECT_EQ(container->firstAd->type, AD_TYPE_INLINE);
             } else {
                 EXPECT_EQ(other.Info()->adBreakCount, 5u);
                 EXPECT_EQ(container->firstAd, BlockOf(other.Info(), "wrapper-only")->firstAd);
@@ -188,53 +195,76 @@ TEST_F(VastHandoff, ModeSwitchesReleaseExactlyWhatWasBuilt) {
     }
 }
 
-// Wrapped documents read from the test data through the module's file access.
-class WrappedFiles : public VastHandoff {
-protected:
-    void SetUp() override {
-        VastHandoff::SetUp();
-        katest::AllowLocalFiles(true);
+TEST_F(VastHandoff, VastOnlyUnreadableBufferFailsButLendsAnEmptyContainer) {
+    handle.SetFlag(KA_PID_VMAP_VAST_ONLY, true);
+    for (const char* buffer : {"plain text", "<VAST><Ad id=\"x\"><InLine>", ""}) {
+        SCOPED_TRACE(buffer);
+        ASSERT_EQ(handle.Process(katest::ReadExample("vast-inline-linear.xml")), KA_OK);
+        EXPECT_EQ(handle.Process(std::string(buffer)), KA_ERR_LOAD_FAILED);
+        VastAdData* data = handle.Container();
+        ASSERT_NE(data, kUntouched);
+        EXPECT_EQ(data->adCount, 0u);
+        EXPECT_EQ(data->firstAd, nullptr);
+        EXPECT_EQ(handle.Info()->adBreakCount, 0u);
     }
-    void TearDown() override { katest::AllowLocalFiles(false); }
+}
 
-    uint32_t ProcessWrapper() {
-        return handle.Process(OneBreak(
-            "<vmap:VASTAdData><VAST><Ad id=\"outer\"><Wrapper><VASTAdTagURI>" +
-            std::string(KA_TEST_DATA_DIR) +
-            "handoff/wrapped_inline.xml</VASTAdTagURI></Wrapper></Ad></VAST></vmap:VASTAdData>"));
+TEST_F(VastHandoff, VastOnlyStopFlagEndsWrapperDownloads) {
+    handle.SetFlag(KA_PID_VMAP_VAST_ONLY, true);
+    KA_BOOL stop = 1;
+    ASSERT_EQ(Api().SetParam(handle.get(), KA_PID_VMAP_STOP_FLAG, &stop), KA_OK);
+    const auto start = std::chrono::steady_clock::now();
+    ASSERT_EQ(handle.Process(katest::WrapperTo("http://127.0.0.1:1/none")), KA_OK);
+    EXPECT_LT(std::chrono::steady_clock::now() - start, std::chrono::seconds(5));
+    VastAdData* data = handle.Container();
+    ASSERT_NE(data, kUntouched);
+    AdWrapper* wrapper = BodyOf<AdWrapper>(data->firstAd, AD_TYPE_WRAPPER);
+    ASSERT_NE(wrapper, nullptr) << "the failed fetch leaves the wrapper";
+    EXPECT_EQ(wrapper->nestedParser, nullptr);
+}
+
+// A wrapped document read from the test data through the module's file access, in both modes:
+// merged, the wrapped InLine takes the wrapper's place (and its duration counts on the break);
+// unmerged, the wrapper keeps a nested parser whose container slot 5 lends, the same each time.
+TEST_F(VastHandoff, MergeFlagDecidesWhatAWrapperBecomes) {
+    katest::AllowLocalFiles(true);
+    const std::string wrapper = katest::WrapperTo();
+    for (bool vastOnly : {false, true}) {
+        for (bool merge : {false, true}) {
+            SCOPED_TRACE(testing::Message() << "vast only " << vastOnly << ", merge " << merge);
+            handle.SetFlag(KA_PID_VMAP_VAST_ONLY, vastOnly);
+            handle.SetFlag(KA_PID_VMAP_MERGE_WRAPPERS, merge);
+            ASSERT_EQ(handle.Process(vastOnly ? wrapper
+                                              : OneBreak("<vmap:VASTAdData>" + wrapper +
+                                                         "</vmap:VASTAdData>")),
+                      KA_OK);
+            VastAdData* data = vastOnly ? handle.Container() : BlockOf(handle.Info(), "b");
+            ASSERT_TRUE(data != nullptr && data != kUntouched);
+            if (!vastOnly) {
+                EXPECT_EQ(handle.Info()->adBreaks->linearDuration, merge ? 10000u : 0u);
+            }
+            if (merge) {
+                AdInLine* inLine = BodyOf<AdInLine>(data->firstAd, AD_TYPE_INLINE);
+                ASSERT_NE(inLine, nullptr);
+                EXPECT_STREQ(inLine->adTitle, "Wrapped Spot");
+                continue;
+            }
+            AdWrapper* outer = BodyOf<AdWrapper>(data->firstAd, AD_TYPE_WRAPPER);
+            ASSERT_NE(outer, nullptr);
+            ASSERT_NE(outer->nestedParser, nullptr);
+            VastAdData *nested = static_cast<VastAdData*>(kUntouched), *again = nullptr;
+            ASSERT_EQ(Api().GetVastParserVastAdData(outer->nestedParser, &nested), KA_OK);
+            ASSERT_EQ(Api().GetVastParserVastAdData(outer->nestedParser, &again), KA_OK);
+            ASSERT_NE(nested, kUntouched);
+            EXPECT_EQ(again, nested);
+            EXPECT_EQ(nested->adCount, 1u);
+            EXPECT_EQ(nested->depth, 1u);
+            EXPECT_STREQ(nested->firstAd->id, "wrapped");
+            AdInLine* inLine = BodyOf<AdInLine>(nested->firstAd, AD_TYPE_INLINE);
+            ASSERT_NE(inLine, nullptr);
+            EXPECT_STREQ(inLine->adTitle, "Wrapped Spot");
+        }
     }
-};
-
-TEST_F(WrappedFiles, MergeFlagDecidesWhatTheBreakHolds) {
-    handle.SetFlag(KA_PID_VMAP_MERGE_WRAPPERS, false);
-    ASSERT_EQ(ProcessWrapper(), KA_OK);
-    EXPECT_EQ(handle.Info()->adBreaks->linearDuration, 0u) << "an unmerged wrapper adds nothing";
-    VastAdData* block = BlockOf(handle.Info(), "b");
-    ASSERT_NE(block, nullptr);
-    AdWrapper* wrapper = BodyOf<AdWrapper>(block->firstAd, AD_TYPE_WRAPPER);
-    ASSERT_NE(wrapper, nullptr);
-    ASSERT_NE(wrapper->nestedParser, nullptr);
-    // Slot 5 lends the nested parser's container, the same one each time.
-    VastAdData* nested = static_cast<VastAdData*>(kUntouched);
-    ASSERT_EQ(Api().GetVastParserVastAdData(wrapper->nestedParser, &nested), KA_OK);
-    ASSERT_NE(nested, kUntouched);
-    EXPECT_EQ(nested->adCount, 1u);
-    EXPECT_EQ(nested->depth, 1u);
-    AdInLine* inLine = BodyOf<AdInLine>(nested->firstAd, AD_TYPE_INLINE);
-    ASSERT_NE(inLine, nullptr);
-    EXPECT_STREQ(inLine->adTitle, "Wrapped Spot");
-    VastAdData* again = nullptr;
-    ASSERT_EQ(Api().GetVastParserVastAdData(wrapper->nestedParser, &again), KA_OK);
-    EXPECT_EQ(again, nested);
-
-    handle.SetFlag(KA_PID_VMAP_MERGE_WRAPPERS, true);
-    ASSERT_EQ(ProcessWrapper(), KA_OK);
-    block = BlockOf(handle.Info(), "b");
-    ASSERT_NE(block, nullptr);
-    inLine = BodyOf<AdInLine>(block->firstAd, AD_TYPE_INLINE);
-    ASSERT_NE(inLine, nullptr) << "the wrapped InLine took the wrapper's place";
-    EXPECT_STREQ(inLine->adTitle, "Wrapped Spot");
-    EXPECT_EQ(handle.Info()->adBreaks->linearDuration, 10000u);
 }
 
 }  // namespace

@@ -5,7 +5,6 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
-#include <cstdlib>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
@@ -32,6 +31,11 @@ const char kArmV7Board[] =
 const char k64BitKernel[] =
     "processor\t: 0\nFeatures\t: fp asimd evtstrm aes pmull sha1 sha2 crc32 cpuid\n"
     "CPU architecture: 8\nCPU part\t: 0xd03\n";
+// Only the first 10 KiB of the description are read: a field past them, one within them, and a
+// value cut by the limit ("ne" is not "neon").
+const std::string kPastTheLimit = std::string(10240, '\n') + "CPU architecture: 7\n";
+const std::string kWithinTheLimit = std::string(10200, '\n') + "CPU architecture: 7\n";
+const std::string kCutAtTheLimit = std::string(10240 - 19, '\n') + "Features\t: vfpv3 neon\n";
 
 auto Fields(const CpuInfoRecord& r) {
     return std::make_tuple(r.type, r.features, r.count, r.maxCpuSpeed, r.minCpuSpeed);
@@ -62,6 +66,10 @@ TEST(ParseFeatures, YieldsTheFeatureBits) {
         {"Vfpv3d16WithoutNeon", "Features\t: swp vfp vfpv3d16\n", 2},
         {"NeonAloneSetsVfpv3TabsSeparate", "Features\t: vfp\tneon\t\n", 6},
         {"LastLineWithoutNewline", "CPU architecture: 7\nFeatures\t: neon", 15},
+        {"ColonOnALaterLine", "CPU architecture\nX: 7\n", 9},
+        {"EmptyValueBeforeALaterColon", "CPU architecture\t: \nX: 7\n", 0},
+        {"ColonEndsTheText", "CPU architecture\t:", 0},
+        {"NameWithoutColon", "CPU architecture\n", 0},
         {"Empty", "", 0}};
     for (const auto& c : cases) {
         SCOPED_TRACE(c.label);
@@ -70,34 +78,9 @@ TEST(ParseFeatures, YieldsTheFeatureBits) {
     }
 }
 
-// The colon may stand on a later line: "Hardware\nX: y" gives "y".
-TEST(ExtractField, ValueRunsFromColonBlankToLineEndWithinLength) {
-    const struct {
-        std::string buffer;
-        int length;            // -1: the whole buffer
-        const char* expected;  // null: not found
-    } cases[] = {{"Hardware\t: board", -1, "board"}, {"Hardware\t: \nX: y\n", -1, ""},
-                 {"Hardware\t:", -1, nullptr},       {"Hardware\n", -1, nullptr},
-                 {"Hardware\nX: y\n", -1, "y"},      {"a: b\nHardware\t: board\n", 5, nullptr},
-                 {"Hardware\t: board\n", 13, "bo"},  {"Hardware\t: board\n", 0, nullptr}};
-    for (const auto& c : cases) {
-        SCOPED_TRACE(testing::PrintToString(c.buffer) + " length " + std::to_string(c.length));
-        std::string buffer = c.buffer;
-        int length = c.length < 0 ? static_cast<int>(buffer.size()) : c.length;
-        char* value = CCpuInfo::extract_cpuinfo_field(buffer.data(), length, "Hardware");
-        EXPECT_STREQ(value, c.expected);
-        free(value);
-    }
-    char buffer[] = "Hardware\t: board\n";
-    EXPECT_EQ(CCpuInfo::extract_cpuinfo_field(nullptr, 10, "Hardware"), nullptr);
-    EXPECT_EQ(CCpuInfo::extract_cpuinfo_field(buffer, sizeof(buffer) - 1, nullptr), nullptr);
-    EXPECT_EQ(CCpuInfo::has_list_item(nullptr, "neon"), 0);
-    EXPECT_EQ(CCpuInfo::has_list_item("a b", ""), 0);
-}
-
 // A folder laid out like the kernel's: cpuinfo, cpuN folders, core 0's frequency files.
 class FakeKernel {
-  public:
+public:
     FakeKernel() : root_(testing::TempDir() + "cpu_info_XXXXXX") {
         EXPECT_NE(mkdtemp(root_.data()), nullptr);
         fs::create_directories(root_ + "/cpu");
@@ -109,8 +92,8 @@ class FakeKernel {
     void AddCores(int count) {
         for (int i = 0; i < count; ++i) fs::create_directories(Path("cpu/cpu" + std::to_string(i)));
     }
-    void Write(const std::string& name, const std::string& text) {
-        std::ofstream(Path(name), std::ios::binary) << text;
+    void Write(const std::string& name, const char* text) {  // null: no file
+        if (text != nullptr) std::ofstream(Path(name), std::ios::binary) << text;
     }
     std::string Path(const std::string& name) const { return root_ + "/" + name; }
     CpuInfoRecord Read() const {
@@ -122,7 +105,7 @@ class FakeKernel {
         return info;
     }
 
-  private:
+private:
     std::string root_;
 };
 
@@ -136,24 +119,19 @@ TEST(CpuDescription, RecordFromTheKernelFiles) {
         {"UnreadableDescription", nullptr, "1800000\n", "300000\n", 8, {0, 0, 1, 0, 0}},
         {"ArmBoardEightCores", kArmV7Board, "1800000\n", "300000", 8, {1, 15, 8, 1800000, 300000}},
         {"MissingMaximumKeepsMinimum", k64BitKernel, nullptr, "408000\n", 2, {1, 9, 2, 0, 408000}},
-        {"EmptyDescriptionAndNonNumericSpeeds", "", "", "fast\n", 0, {1, 0, 1, 0, 0}}};
+        {"EmptyDescriptionAndNonNumericSpeeds", "", "", "fast\n", 0, {1, 0, 1, 0, 0}},
+        {"ArchitecturePast10KiB", kPastTheLimit.c_str(), nullptr, nullptr, 0, {1, 0, 1, 0, 0}},
+        {"ArchitectureWithin10KiB", kWithinTheLimit.c_str(), nullptr, nullptr, 0, {1, 9, 1, 0, 0}},
+        {"FeaturesCutAt10KiB", kCutAtTheLimit.c_str(), nullptr, nullptr, 0, {1, 2, 1, 0, 0}}};
     for (const auto& c : cases) {
         SCOPED_TRACE(c.label);
         FakeKernel kernel;
         kernel.AddCores(c.cores);
-        if (c.cpuinfo != nullptr) kernel.Write("cpuinfo", c.cpuinfo);
-        if (c.max != nullptr) kernel.Write("max", c.max);
-        if (c.min != nullptr) kernel.Write("min", c.min);
+        kernel.Write("cpuinfo", c.cpuinfo);
+        kernel.Write("max", c.max);
+        kernel.Write("min", c.min);
         EXPECT_EQ(Fields(kernel.Read()), Fields(c.expected));
     }
-}
-
-TEST(CpuDescription, OnlyTheFirstTenKilobytesAreRead) {
-    FakeKernel kernel;
-    kernel.Write("cpuinfo", std::string(10240, '\n') + "CPU architecture: 7\n");
-    EXPECT_EQ(kernel.Read().features, 0u);
-    kernel.Write("cpuinfo", std::string(10200, '\n') + "CPU architecture: 7\n");
-    EXPECT_EQ(kernel.Read().features, 9u);
 }
 
 TEST(CountCpu, ProbesOnlyOddCoreFoldersUpTo21) {
@@ -168,25 +146,11 @@ TEST(CountCpu, ProbesOnlyOddCoreFoldersUpTo21) {
     EXPECT_EQ(CCpuInfo::count_cpu_in(nullptr), 1);
 }
 
-// The highest odd-numbered core folder the kernel lists gives the count.
-int ExpectedCoreCount() {
-    for (int n = 21; n >= 1; n -= 2) {
-        if (fs::is_directory("/sys/devices/system/cpu/cpu" + std::to_string(n))) return n + 1;
-    }
-    return 1;
-}
-
-int ExpectedSpeed(const char* name) {
-    int speed = 0;
-    std::ifstream(std::string("/sys/devices/system/cpu/cpu0/cpufreq/") + name) >> speed;
-    return speed;
-}
-
+// The first callers of the process, at once and through either entry point, get what the
+// kernel's files (named here, not taken from the library) hold.
 TEST(CpuInfoOnThisMachine, RecordAgreesWithTheKernelFiles) {
     EXPECT_EQ(get_cpu_info(nullptr), -1);
     EXPECT_EQ(CCpuInfo::getInfo(nullptr), -1);
-
-    // The first callers of the process, at once and through either entry point.
     std::vector<CpuInfoRecord> records(8);
     std::vector<int> results(records.size(), -2);
     std::vector<std::thread> threads;
@@ -202,16 +166,22 @@ TEST(CpuInfoOnThisMachine, RecordAgreesWithTheKernelFiles) {
     std::string description(10240, '\0');
     in.read(description.data(), description.size());
     description.resize(in.gcount());
+    const std::string cpu = "/sys/devices/system/cpu/cpu";
+    int cores = 1, speeds[2] = {0, 0};
+    for (int n = 21; n >= 1 && cores == 1; n -= 2) {
+        if (fs::is_directory(cpu + std::to_string(n))) cores = n + 1;
+    }
+    std::ifstream(cpu + "0/cpufreq/cpuinfo_max_freq") >> speeds[0];
+    std::ifstream(cpu + "0/cpufreq/cpuinfo_min_freq") >> speeds[1];
     const CpuInfoRecord expected = {
         readable ? KA_CPU_TYPE_ARM : KA_CPU_TYPE_UNKNOWN,
         CCpuInfo::parse_features(description.data(), static_cast<int>(description.size())),
-        readable ? ExpectedCoreCount() : 1, readable ? ExpectedSpeed("cpuinfo_max_freq") : 0,
-        readable ? ExpectedSpeed("cpuinfo_min_freq") : 0};
+        readable ? cores : 1, readable ? speeds[0] : 0, readable ? speeds[1] : 0};
     for (size_t i = 0; i < records.size(); ++i) {
         EXPECT_EQ(results[i], 0);
         EXPECT_EQ(Fields(records[i]), Fields(expected)) << i;
     }
-    EXPECT_EQ(CCpuInfo::count_cpu(), ExpectedCoreCount());
+    EXPECT_EQ(CCpuInfo::count_cpu(), cores);
 }
 
 TEST(LoaderDefaults, VariantSuffixOnlyForArmWithNeon) {

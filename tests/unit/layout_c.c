@@ -26,27 +26,11 @@ _Static_assert(sizeof(CVASTParser*) == sizeof(void*), "opaque pointers are point
 static uint32_t (*const kEntry)(VMAPParserAPI*) = kaGetVMAPParserAPI;
 static uintptr_t (*const kAdapter)(void) = kaGetVMAPParserAPIAdapter;
 
-#define KA_MEASURE_FIELD(T, f, off, size) {#T "." #f, offsetof(T, f), sizeof(((T*)0)->f)},
-#define KA_MEASURE_SIZE(T, size) sizeof(T),
-#define KA_MEASURE_CONSTANT(name, value) (name),
+static const KaFieldLayout kMeasured[] = {KA_LAYOUT_MEASURED};
 
-static const KaFieldLayout kFields[] = {KA_LAYOUT_FIELDS(KA_MEASURE_FIELD)};
-static const unsigned long kSizes[] = {KA_LAYOUT_SIZES(KA_MEASURE_SIZE)};
-static const unsigned long kConstants[] = {KA_LAYOUT_CONSTANTS(KA_MEASURE_CONSTANT)};
-
-const KaFieldLayout* ka_layout_fields_c(unsigned long* count) {
+const KaFieldLayout* ka_layout_c(unsigned long* count) {
     (void)kEntry;
     (void)kAdapter;
-    *count = sizeof(kFields) / sizeof(kFields[0]);
-    return kFields;
-}
-
-const unsigned long* ka_layout_sizes_c(unsigned long* count) {
-    *count = sizeof(kSizes) / sizeof(kSizes[0]);
-    return kSizes;
-}
-
-const unsigned long* ka_layout_constants_c(unsigned long* count) {
-    *count = sizeof(kConstants) / sizeof(kConstants[0]);
-    return kConstants;
+    *count = sizeof(kMeasured) / sizeof(kMeasured[0]);
+    return kMeasured;
 }

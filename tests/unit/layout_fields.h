@@ -3,180 +3,103 @@
 #ifndef KA_TEST_LAYOUT_FIELDS_H
 #define KA_TEST_LAYOUT_FIELDS_H
 
+/* clang-format off */
 /* X(record, field, offset, size) */
-#define KA_LAYOUT_FIELDS(X)                          \
-    X(VastAdData, adCount, 0, 4)                     \
-    X(VastAdData, firstAd, 8, 8)                     \
-    X(VastAdData, errorUrl, 16, 8)                   \
-    X(VastAdData, depth, 24, 4)                      \
-    X(AdData, id, 0, 8)                              \
-    X(AdData, sequence, 8, 4)                        \
-    X(AdData, type, 12, 4)                           \
-    X(AdData, body, 16, 8)                           \
-    X(AdData, next, 24, 8)                           \
-    X(AdInLine, adSystem, 0, 8)                      \
-    X(AdInLine, adTitle, 8, 8)                       \
-    X(AdInLine, impressionCount, 16, 4)              \
-    X(AdInLine, impressions, 24, 8)                  \
-    X(AdInLine, description, 32, 8)                  \
-    X(AdInLine, advertiser, 40, 8)                   \
-    X(AdInLine, survey, 48, 8)                       \
-    X(AdInLine, error, 56, 8)                        \
-    X(AdInLine, extensions, 64, 8)                   \
-    X(AdInLine, creativeCount, 72, 4)                \
-    X(AdInLine, creatives, 80, 8)                    \
-    X(AdWrapper, adSystem, 0, 8)                     \
-    X(AdWrapper, vastAdTagUri, 8, 8)                 \
-    X(AdWrapper, error, 16, 8)                       \
-    X(AdWrapper, impressions, 24, 8)                 \
-    X(AdWrapper, creatives, 32, 8)                   \
-    X(AdWrapper, extensions, 40, 8)                  \
-    X(AdWrapper, nestedParser, 48, 8)                \
-    X(AdImpression, url, 0, 8)                       \
-    X(AdImpression, next, 8, 8)                      \
-    X(AdCreative, id, 0, 8)                          \
-    X(AdCreative, sequence, 8, 4)                    \
-    X(AdCreative, adId, 16, 8)                       \
-    X(AdCreative, kind, 24, 4)                       \
-    X(AdCreative, content, 32, 96)                   \
-    X(AdCreative, next, 128, 8)                      \
-    X(AdLinear, duration, 0, 8)                      \
-    X(AdLinear, skipOffset, 8, 8)                    \
-    X(AdLinear, mediaFileCount, 16, 4)               \
-    X(AdLinear, mediaFiles, 24, 8)                   \
-    X(AdLinear, videoClicksCount, 32, 4)             \
-    X(AdLinear, videoClicks, 40, 8)                  \
-    X(AdLinear, adParametersCount, 48, 4)            \
-    X(AdLinear, adParameters, 56, 8)                 \
-    X(AdLinear, trackingCount, 64, 4)                \
-    X(AdLinear, trackingEvents, 72, 8)               \
-    X(AdLinear, iconCount, 80, 4)                    \
-    X(AdLinear, icons, 88, 8)                        \
-    X(AdVideoClicks, clickThroughCount, 0, 4)        \
-    X(AdVideoClicks, clickThroughs, 8, 8)            \
-    X(AdVideoClicks, clickTrackingCount, 16, 4)      \
-    X(AdVideoClicks, clickTrackings, 24, 8)          \
-    X(AdVideoClicks, customClickCount, 32, 4)        \
-    X(AdVideoClicks, customClicks, 40, 8)            \
-    X(AdVideoClicks, next, 48, 8)                    \
-    X(AdClick, id, 0, 8)                             \
-    X(AdClick, url, 8, 8)                            \
-    X(AdClick, next, 16, 8)                          \
-    X(AdMediaFile, delivery, 0, 4)                   \
-    X(AdMediaFile, type, 8, 8)                       \
-    X(AdMediaFile, width, 16, 4)                     \
-    X(AdMediaFile, height, 20, 4)                    \
-    X(AdMediaFile, codec, 24, 8)                     \
-    X(AdMediaFile, id, 32, 4)                        \
-    X(AdMediaFile, bitrate, 36, 4)                   \
-    X(AdMediaFile, minBitrate, 40, 4)                \
-    X(AdMediaFile, maxBitrate, 44, 4)                \
-    X(AdMediaFile, scalable, 48, 4)                  \
-    X(AdMediaFile, maintainAspectRatio, 52, 4)       \
-    X(AdMediaFile, url, 56, 8)                       \
-    X(AdMediaFile, next, 64, 8)                      \
-    X(AdTracking, event, 0, 8)                       \
-    X(AdTracking, offsetKind, 8, 4)                  \
-    X(AdTracking, offset, 16, 8)                     \
-    X(AdTracking, url, 24, 8)                        \
-    X(AdTracking, next, 32, 8)                       \
-    X(AdParameters, next, 0, 8)                      \
-    X(AdIcon, next, 0, 8)                            \
-    X(AdInfo, adBreakCount, 0, 4)                    \
-    X(AdInfo, adBreaks, 8, 8)                        \
-    X(AdBreak, timeOffsetType, 0, 4)                 \
-    X(AdBreak, timeOffset, 8, 8)                     \
-    X(AdBreak, linearDuration, 16, 8)                \
-    X(AdBreak, breakType, 24, 4)                     \
-    X(AdBreak, breakId, 32, 8)                       \
-    X(AdBreak, repeatAfter, 40, 8)                   \
-    X(AdBreak, adSource, 48, 8)                      \
-    X(AdBreak, trackings, 56, 8)                     \
-    X(AdBreak, next, 64, 8)                          \
-    X(AdSource, id, 0, 4)                            \
-    X(AdSource, allowMultipleAds, 4, 4)              \
-    X(AdSource, followRedirects, 8, 4)               \
-    X(AdSource, adTagUri, 16, 8)                     \
-    X(AdSource, reservedText, 24, 8)                 \
-    X(AdSource, vastAdData, 32, 8)                   \
-    X(AdBreakTracking, event, 0, 8)                  \
-    X(AdBreakTracking, url, 8, 8)                    \
-    X(AdBreakTracking, next, 16, 8)                  \
-    X(VMAPParserAPI, Open, 0, 8)                     \
-    X(VMAPParserAPI, Close, 8, 8)                    \
-    X(VMAPParserAPI, Process, 16, 8)                 \
-    X(VMAPParserAPI, GetAdInfo, 24, 8)               \
-    X(VMAPParserAPI, GetVastAdData, 32, 8)           \
-    X(VMAPParserAPI, GetVastParserVastAdData, 40, 8) \
-    X(VMAPParserAPI, SetParam, 48, 8)                \
+#define KA_LAYOUT_FIELDS(X) \
+    X(VastAdData, adCount, 0, 4) X(VastAdData, firstAd, 8, 8) X(VastAdData, errorUrl, 16, 8) \
+    X(VastAdData, depth, 24, 4) \
+    X(AdData, id, 0, 8) X(AdData, sequence, 8, 4) X(AdData, type, 12, 4) X(AdData, body, 16, 8) \
+    X(AdData, next, 24, 8) \
+    X(AdInLine, adSystem, 0, 8) X(AdInLine, adTitle, 8, 8) X(AdInLine, impressionCount, 16, 4) \
+    X(AdInLine, impressions, 24, 8) X(AdInLine, description, 32, 8) \
+    X(AdInLine, advertiser, 40, 8) X(AdInLine, survey, 48, 8) X(AdInLine, error, 56, 8) \
+    X(AdInLine, extensions, 64, 8) X(AdInLine, creativeCount, 72, 4) \
+    X(AdInLine, creatives, 80, 8) \
+    X(AdWrapper, adSystem, 0, 8) X(AdWrapper, vastAdTagUri, 8, 8) X(AdWrapper, error, 16, 8) \
+    X(AdWrapper, impressions, 24, 8) X(AdWrapper, creatives, 32, 8) \
+    X(AdWrapper, extensions, 40, 8) X(AdWrapper, nestedParser, 48, 8) \
+    X(AdImpression, url, 0, 8) X(AdImpression, next, 8, 8) \
+    X(AdCreative, id, 0, 8) X(AdCreative, sequence, 8, 4) X(AdCreative, adId, 16, 8) \
+    X(AdCreative, kind, 24, 4) X(AdCreative, content, 32, 96) X(AdCreative, next, 128, 8) \
+    X(AdLinear, duration, 0, 8) X(AdLinear, skipOffset, 8, 8) \
+    X(AdLinear, mediaFileCount, 16, 4) X(AdLinear, mediaFiles, 24, 8) \
+    X(AdLinear, videoClicksCount, 32, 4) X(AdLinear, videoClicks, 40, 8) \
+    X(AdLinear, adParametersCount, 48, 4) X(AdLinear, adParameters, 56, 8) \
+    X(AdLinear, trackingCount, 64, 4) X(AdLinear, trackingEvents, 72, 8) \
+    X(AdLinear, iconCount, 80, 4) X(AdLinear, icons, 88, 8) \
+    X(AdVideoClicks, clickThroughCount, 0, 4) X(AdVideoClicks, clickThroughs, 8, 8) \
+    X(AdVideoClicks, clickTrackingCount, 16, 4) X(AdVideoClicks, clickTrackings, 24, 8) \
+    X(AdVideoClicks, customClickCount, 32, 4) X(AdVideoClicks, customClicks, 40, 8) \
+    X(AdVideoClicks, next, 48, 8) \
+    X(AdClick, id, 0, 8) X(AdClick, url, 8, 8) X(AdClick, next, 16, 8) \
+    X(AdMediaFile, delivery, 0, 4) X(AdMediaFile, type, 8, 8) X(AdMediaFile, width, 16, 4) \
+    X(AdMediaFile, height, 20, 4) X(AdMediaFile, codec, 24, 8) X(AdMediaFile, id, 32, 4) \
+    X(AdMediaFile, bitrate, 36, 4) X(AdMediaFile, minBitrate, 40, 4) \
+    X(AdMediaFile, maxBitrate, 44, 4) X(AdMediaFile, scalable, 48, 4) \
+    X(AdMediaFile, maintainAspectRatio, 52, 4) X(AdMediaFile, url, 56, 8) \
+    X(AdMediaFile, next, 64, 8) \
+    X(AdTracking, event, 0, 8) X(AdTracking, offsetKind, 8, 4) X(AdTracking, offset, 16, 8) \
+    X(AdTracking, url, 24, 8) X(AdTracking, next, 32, 8) \
+    X(AdParameters, next, 0, 8) X(AdIcon, next, 0, 8) \
+    X(AdInfo, adBreakCount, 0, 4) X(AdInfo, adBreaks, 8, 8) \
+    X(AdBreak, timeOffsetType, 0, 4) X(AdBreak, timeOffset, 8, 8) \
+    X(AdBreak, linearDuration, 16, 8) X(AdBreak, breakType, 24, 4) X(AdBreak, breakId, 32, 8) \
+    X(AdBreak, repeatAfter, 40, 8) X(AdBreak, adSource, 48, 8) X(AdBreak, trackings, 56, 8) \
+    X(AdBreak, next, 64, 8) \
+    X(AdSource, id, 0, 4) X(AdSource, allowMultipleAds, 4, 4) \
+    X(AdSource, followRedirects, 8, 4) X(AdSource, adTagUri, 16, 8) \
+    X(AdSource, reservedText, 24, 8) X(AdSource, vastAdData, 32, 8) \
+    X(AdBreakTracking, event, 0, 8) X(AdBreakTracking, url, 8, 8) \
+    X(AdBreakTracking, next, 16, 8) \
+    X(VMAPParserAPI, Open, 0, 8) X(VMAPParserAPI, Close, 8, 8) X(VMAPParserAPI, Process, 16, 8) \
+    X(VMAPParserAPI, GetAdInfo, 24, 8) X(VMAPParserAPI, GetVastAdData, 32, 8) \
+    X(VMAPParserAPI, GetVastParserVastAdData, 40, 8) X(VMAPParserAPI, SetParam, 48, 8) \
     X(VMAPParserAPI, GetParam, 56, 8)
 
 /* X(record, size) */
 #define KA_LAYOUT_SIZES(X) \
-    X(VastAdData, 32)      \
-    X(AdData, 32)          \
-    X(AdInLine, 88)        \
-    X(AdWrapper, 56)       \
-    X(AdImpression, 16)    \
-    X(AdCreative, 136)     \
-    X(AdLinear, 96)        \
-    X(AdVideoClicks, 56)   \
-    X(AdClick, 24)         \
-    X(AdMediaFile, 72)     \
-    X(AdTracking, 40)      \
-    X(AdParameters, 8)     \
-    X(AdIcon, 8)           \
-    X(AdInfo, 16)          \
-    X(AdBreak, 72)         \
-    X(AdSource, 40)        \
-    X(AdBreakTracking, 24) \
-    X(VMAPParserAPI, 64)
+    X(VastAdData, 32) X(AdData, 32) X(AdInLine, 88) X(AdWrapper, 56) X(AdImpression, 16) \
+    X(AdCreative, 136) X(AdLinear, 96) X(AdVideoClicks, 56) X(AdClick, 24) X(AdMediaFile, 72) \
+    X(AdTracking, 40) X(AdParameters, 8) X(AdIcon, 8) X(AdInfo, 16) X(AdBreak, 72) \
+    X(AdSource, 40) X(AdBreakTracking, 24) X(VMAPParserAPI, 64)
 
 /* X(constant, value) */
-#define KA_LAYOUT_CONSTANTS(X)                   \
-    X(AD_TYPE_UNKNOWN, 0u)                       \
-    X(AD_TYPE_INLINE, 1u)                        \
-    X(AD_TYPE_WRAPPER, 2u)                       \
-    X(AD_CREATIVE_NONE, 0u)                      \
-    X(AD_CREATIVE_LINEAR, 1u)                    \
-    X(AD_DELIVERY_PROGRESSIVE, 0u)               \
-    X(AD_DELIVERY_STREAMING, 1u)                 \
-    X(AD_OFFSET_NONE, 0u)                        \
-    X(AD_OFFSET_TIME, 1u)                        \
-    X(AD_OFFSET_PERCENT, 2u)                     \
+#define KA_LAYOUT_CONSTANTS(X) \
+    X(AD_TYPE_UNKNOWN, 0u) X(AD_TYPE_INLINE, 1u) X(AD_TYPE_WRAPPER, 2u) \
+    X(AD_CREATIVE_NONE, 0u) X(AD_CREATIVE_LINEAR, 1u) \
+    X(AD_DELIVERY_PROGRESSIVE, 0u) X(AD_DELIVERY_STREAMING, 1u) \
+    X(AD_OFFSET_NONE, 0u) X(AD_OFFSET_TIME, 1u) X(AD_OFFSET_PERCENT, 2u) \
     X(KA_PID_VAST_EXTENSION_PARSER, 0x45000001u) \
-    X(TIME_OFFSET_NONE, 0u)                      \
-    X(TIME_OFFSET_CLOCK, 1u)                     \
-    X(TIME_OFFSET_PERCENT, 2u)                   \
-    X(TIME_OFFSET_START_END, 3u)                 \
-    X(TIME_OFFSET_POSITION, 4u)                  \
-    X(BREAK_TYPE_LINEAR, 1u)                     \
-    X(BREAK_TYPE_NONLINEAR, 2u)                  \
-    X(BREAK_TYPE_COMPANION, 4u)                  \
-    X(BREAK_TYPE_SKIPPABLE, 8u)                  \
-    X(BREAK_TYPE_ADPODS, 16u)                    \
-    X(KA_PID_VMAP_CONTENT_URI, 0x44000001u)      \
-    X(KA_PID_VMAP_VAST_ONLY, 0x44000002u)        \
-    X(KA_PID_VMAP_MERGE_WRAPPERS, 0x44000003u)   \
-    X(KA_PID_VMAP_STOP_FLAG, 0x44000004u)        \
-    X(KA_ERR_NULL_ARGUMENT, 0x9100100bu)         \
-    X(KA_ERR_LOAD_FAILED, 0x91001000u)           \
+    X(TIME_OFFSET_NONE, 0u) X(TIME_OFFSET_CLOCK, 1u) X(TIME_OFFSET_PERCENT, 2u) \
+    X(TIME_OFFSET_START_END, 3u) X(TIME_OFFSET_POSITION, 4u) \
+    X(BREAK_TYPE_LINEAR, 1u) X(BREAK_TYPE_NONLINEAR, 2u) X(BREAK_TYPE_COMPANION, 4u) \
+    X(BREAK_TYPE_SKIPPABLE, 8u) X(BREAK_TYPE_ADPODS, 16u) \
+    X(KA_PID_VMAP_CONTENT_URI, 0x44000001u) X(KA_PID_VMAP_VAST_ONLY, 0x44000002u) \
+    X(KA_PID_VMAP_MERGE_WRAPPERS, 0x44000003u) X(KA_PID_VMAP_STOP_FLAG, 0x44000004u) \
+    X(KA_ERR_NULL_ARGUMENT, 0x9100100bu) X(KA_ERR_LOAD_FAILED, 0x91001000u) \
     X(KA_ERR_MODULE_NOT_LOADED, 0x90000001u)
+/* clang-format on */
 
-/* One measured field, as the C compiler laid it out. */
+/* One measured item as the C compiler sees it: a field (offset, size), a record's sizeof (offset
+ * 0) or a constant (offset 0, size holding the value). */
 typedef struct KaFieldLayout {
     const char* name;
     unsigned long offset;
     unsigned long size;
 } KaFieldLayout;
 
+#define KA_MEASURE_FIELD(T, f, off, size) {#T "." #f, offsetof(T, f), sizeof(((T*)0)->f)},
+#define KA_MEASURE_SIZE(T, size) {#T, 0, sizeof(T)},
+#define KA_MEASURE_CONSTANT(name, value) {#name, 0, (name)},
+#define KA_LAYOUT_MEASURED             \
+    KA_LAYOUT_FIELDS(KA_MEASURE_FIELD) \
+    KA_LAYOUT_SIZES(KA_MEASURE_SIZE) KA_LAYOUT_CONSTANTS(KA_MEASURE_CONSTANT)
+
 #ifdef __cplusplus
 extern "C" {
 #endif
 /* The C compiler's view, in list order: every field, every record's sizeof, every constant. */
-const KaFieldLayout* ka_layout_fields_c(unsigned long* count);
-const unsigned long* ka_layout_sizes_c(unsigned long* count);
-const unsigned long* ka_layout_constants_c(unsigned long* count);
+const KaFieldLayout* ka_layout_c(unsigned long* count);
 #ifdef __cplusplus
 }
 #endif

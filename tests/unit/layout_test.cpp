@@ -1,5 +1,5 @@
 // The public VAST and VMAP records, the constants and the API table keep one layout for C and
-// C++ players.
+// C++ players. The C side pins the LP64 values at build time; here the C++ view must match it.
 #include <gtest/gtest.h>
 
 #include <cstddef>
@@ -11,22 +11,7 @@
 
 namespace {
 
-struct Measured {
-    const char* name;
-    unsigned long offset;  // 0 for a record size or a constant
-    unsigned long size;    // size of the field or record; a constant's value
-    unsigned long expectedOffset;
-    unsigned long expected;
-};
-
-#define KA_CXX_FIELD(T, f, off, size) \
-    {#T "." #f, offsetof(T, f), sizeof(((T*)nullptr)->f), off, size},
-#define KA_CXX_SIZE(T, size) {#T, 0, sizeof(T), 0, size},
-#define KA_CXX_CONSTANT(name, value) {#name, 0, name, 0, value},
-
-const Measured kFields[] = {KA_LAYOUT_FIELDS(KA_CXX_FIELD)};
-const Measured kSizes[] = {KA_LAYOUT_SIZES(KA_CXX_SIZE)};
-const Measured kConstants[] = {KA_LAYOUT_CONSTANTS(KA_CXX_CONSTANT)};
+const KaFieldLayout kCxx[] = {KA_LAYOUT_MEASURED};
 
 #define KA_CXX_TRAITS(T, size)                                                    \
     static_assert(std::is_standard_layout<T>::value && std::is_trivial<T>::value, \
@@ -34,59 +19,34 @@ const Measured kConstants[] = {KA_LAYOUT_CONSTANTS(KA_CXX_CONSTANT)};
 KA_LAYOUT_SIZES(KA_CXX_TRAITS)
 
 // Signedness is part of what a player reads.
-#define KA_SIGNED(T, f) static_assert(std::is_signed<decltype(T::f)>::value, #T "." #f);
-#define KA_UNSIGNED(T, f) static_assert(std::is_unsigned<decltype(T::f)>::value, #T "." #f);
-KA_SIGNED(AdLinear, skipOffset)
-KA_UNSIGNED(AdLinear, duration)
-KA_SIGNED(AdTracking, offset)
-KA_SIGNED(AdData, sequence)
-KA_UNSIGNED(AdData, type)
-KA_SIGNED(AdMediaFile, width)
-KA_UNSIGNED(AdMediaFile, delivery)
-KA_UNSIGNED(AdInfo, adBreakCount)
-KA_UNSIGNED(AdBreak, timeOffsetType)
-KA_SIGNED(AdBreak, timeOffset)
-KA_UNSIGNED(AdBreak, linearDuration)
-KA_UNSIGNED(AdBreak, breakType)
-KA_UNSIGNED(AdBreak, repeatAfter)
-KA_SIGNED(AdSource, id)
-static_assert(std::is_same<decltype(AdSource::allowMultipleAds), KA_BOOL>::value, "");
-static_assert(std::is_same<decltype(AdSource::followRedirects), KA_BOOL>::value, "");
-static_assert(std::is_same<decltype(AdSource::vastAdData), VastAdData*>::value, "");
+#define KA_SIGNED(T, f) std::is_signed<decltype(T::f)>::value
+#define KA_UNSIGNED(T, f) std::is_unsigned<decltype(T::f)>::value
+#define KA_TYPE(T, f, type) std::is_same<decltype(T::f), type>::value
+static_assert(KA_SIGNED(AdLinear, skipOffset) && KA_SIGNED(AdTracking, offset) &&
+                  KA_SIGNED(AdData, sequence) && KA_SIGNED(AdMediaFile, width) &&
+                  KA_SIGNED(AdBreak, timeOffset) && KA_SIGNED(AdSource, id),
+              "signed fields");
+static_assert(KA_UNSIGNED(AdLinear, duration) && KA_UNSIGNED(AdData, type) &&
+                  KA_UNSIGNED(AdMediaFile, delivery) && KA_UNSIGNED(AdInfo, adBreakCount) &&
+                  KA_UNSIGNED(AdBreak, timeOffsetType) && KA_UNSIGNED(AdBreak, linearDuration) &&
+                  KA_UNSIGNED(AdBreak, breakType) && KA_UNSIGNED(AdBreak, repeatAfter),
+              "unsigned fields");
+static_assert(KA_TYPE(AdSource, allowMultipleAds, KA_BOOL) &&
+                  KA_TYPE(AdSource, followRedirects, KA_BOOL) &&
+                  KA_TYPE(AdSource, vastAdData, VastAdData*),
+              "AdSource field types");
 
-template <size_t N>
-void ExpectSameValues(const unsigned long* c, unsigned long count, const Measured (&cxx)[N]) {
-    ASSERT_EQ(count, N);
-    for (size_t i = 0; i < N; ++i) EXPECT_EQ(c[i], cxx[i].size) << cxx[i].name;
-}
-
-// The C side's fields, sizes and constants, in list order, against the C++ side's.
+// Every field's offset and width, every record's size and every constant's value, in list order.
 TEST(Layout, CAndCxxAgree) {
     unsigned long count = 0;
-    const KaFieldLayout* fields = ka_layout_fields_c(&count);
-    ASSERT_EQ(count, sizeof(kFields) / sizeof(kFields[0]));
+    const KaFieldLayout* c = ka_layout_c(&count);
+    ASSERT_EQ(count, sizeof(kCxx) / sizeof(kCxx[0]));
     for (unsigned long i = 0; i < count; ++i) {
-        SCOPED_TRACE(kFields[i].name);
-        EXPECT_EQ(std::string(fields[i].name), kFields[i].name);
-        EXPECT_EQ(fields[i].offset, kFields[i].offset);
-        EXPECT_EQ(fields[i].size, kFields[i].size);
+        SCOPED_TRACE(kCxx[i].name);
+        EXPECT_EQ(std::string(c[i].name), kCxx[i].name);
+        EXPECT_EQ(c[i].offset, kCxx[i].offset);
+        EXPECT_EQ(c[i].size, kCxx[i].size);
     }
-    const unsigned long* sizes = ka_layout_sizes_c(&count);
-    ExpectSameValues(sizes, count, kSizes);
-    const unsigned long* constants = ka_layout_constants_c(&count);
-    ExpectSameValues(constants, count, kConstants);
-}
-
-// The C++ side against the fixed values (the C side checks them at build time).
-TEST(Layout, FixedOffsetsWidthsAndValues) {
-    for (const Measured& m : kConstants) EXPECT_EQ(m.size, m.expected) << m.name;
-#if defined(__LP64__)
-    for (const Measured& m : kFields) {
-        EXPECT_EQ(m.offset, m.expectedOffset) << m.name;
-        EXPECT_EQ(m.size, m.expected) << m.name;
-    }
-    for (const Measured& m : kSizes) EXPECT_EQ(m.size, m.expected) << m.name;
-#endif
 }
 
 }  // namespace

@@ -1,5 +1,7 @@
 // The loader seen through a recording libkadl.so: which names it asks for, in which order, and
 // what it keeps afterwards.
+#include "platform/lib_loader.h"
+
 #include <dlfcn.h>
 #include <gtest/gtest.h>
 
@@ -7,7 +9,6 @@
 #include <vector>
 
 #include "ka/module_loading.h"
-#include "platform/lib_loader.h"
 
 namespace {
 
@@ -59,6 +60,7 @@ TEST_F(LibLoaderTest, AsksForTheCandidatesInOrder) {
         std::vector<std::string> asks;  // in order, after the working path
         bool found;                     // the last name asked for loads
     } const cases[] = {
+        // clang-format off
         {"fourth candidate", false, "kaSourceIO", 0, allFour, true},
         {"first candidate", false, "kaSourceIO", 0, {"kaSourceIO"}, true},
         {"none found", false, "kaSourceIO", 0, allFour, false},
@@ -72,6 +74,7 @@ TEST_F(LibLoaderTest, AsksForTheCandidatesInOrder) {
         {"unlisted module has no variant", true, "kaSourceIO", 7,
          {"libkaSourceIO.so", "libkaSourceIO.so"}, false},
         {"other cpu version, no variant", true, "kaVidDec", 6, {"libkaVidDec.so"}, false},
+        // clang-format on
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(c.label);
@@ -156,45 +159,41 @@ TEST_F(LibLoaderTest, IncompleteOrMissingServiceLoadsNothing) {
     }
 }
 
-TEST_F(LibLoaderTest, VariantLibAsksNothingWithoutSuffixOrSo) {
+// Names that cannot load ask the service for nothing and stay inside their buffers.
+TEST_F(LibLoaderTest, VariantWithoutSuffixOrSoAndOverlongNames) {
     CLibLoader loader;
     loader.SetWorkPath(workPath.data());
-    std::string path = workPath + "libkaVidDec.so";
+    std::string path = workPath + "libkaVidDec.so", noSo = workPath + "libkaVidDec";
     EXPECT_EQ(loader.LoadVariantLib(path.data()), nullptr);
     loader.SetCpuVersion(7);
     loader.SetCpuVersion(5);  // other versions never clear the suffix
     EXPECT_STREQ(loader.mLibSuffix, "_v7.so");
-    std::string noSo = workPath + "libkaVidDec";
     EXPECT_EQ(loader.LoadVariantLib(noSo.data()), nullptr);
     EXPECT_TRUE(Log().empty());
     EXPECT_EQ(loader.mServiceHandle, nullptr);
-}
 
-TEST_F(LibLoaderTest, OverlongNamesStayInsideTheirBuffers) {
     std::string longPath = "/" + std::string(400, 'd') + "/";
-    CLibLoader loader;
-    loader.SetWorkPath(longPath.data());
-    memset(loader.mLibName, 'n', sizeof(loader.mLibName) - 1);
-    loader.mLibName[sizeof(loader.mLibName) - 1] = '\0';
-    EXPECT_EQ(loader.LoadLib(nullptr), 0);
-    EXPECT_LT(strnlen(loader.mLibName, sizeof(loader.mLibName)), sizeof(loader.mLibName));
+    CLibLoader overlong;
+    overlong.SetWorkPath(longPath.data());
+    memset(overlong.mLibName, 'n', sizeof(overlong.mLibName) - 1);
+    overlong.mLibName[sizeof(overlong.mLibName) - 1] = '\0';
+    EXPECT_EQ(overlong.LoadLib(nullptr), 0);
+    EXPECT_LT(strnlen(overlong.mLibName, sizeof(overlong.mLibName)), sizeof(overlong.mLibName));
 }
 
 TEST(ModuleFunctions, WrapTheDynamicLoader) {
     std::string path = kFakeDir + "libkadl.so";
+    char symbol[] = "kaLoadLibrary", empty[] = "", missing[] = "no_such_symbol";
+    char nowhere[] = "/nonexistent/libnothing.so";
     void* handle = kaLoadLib0x010d0000(path.data());
     ASSERT_NE(handle, nullptr);
-    char symbol[] = "kaLoadLibrary";
-    char empty[] = "";
-    char missing[] = "no_such_symbol";
     EXPECT_NE(kaGetAddress0x010d0000(handle, symbol), nullptr);
-    EXPECT_EQ(kaGetAddress0x010d0000(handle, missing), nullptr);
-    EXPECT_EQ(kaGetAddress0x010d0000(handle, empty), nullptr);
-    EXPECT_EQ(kaGetAddress0x010d0000(handle, nullptr), nullptr);
+    for (char* name : {missing, empty, static_cast<char*>(nullptr)}) {
+        EXPECT_EQ(kaGetAddress0x010d0000(handle, name), nullptr);
+    }
     EXPECT_EQ(kaGetAddress0x010d0000(nullptr, symbol), nullptr);
     EXPECT_EQ(kaFreeLib0x010d0000(handle), 0);
     EXPECT_EQ(kaFreeLib0x010d0000(nullptr), -1);
-    char nowhere[] = "/nonexistent/libnothing.so";
     EXPECT_EQ(kaLoadLib0x010d0000(nowhere), nullptr);
 }
 

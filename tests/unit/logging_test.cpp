@@ -18,7 +18,11 @@ namespace {
 const std::string kFakes = KA_FAKES_DIR;
 const std::string kRecording = kFakes + "recording_logsys";
 const std::string kWithoutSetParam = kFakes + "logsys_without_setparam";
-const std::string kWithoutRpc = kFakes + "logsys_without_rpc";
+const std::string kMissing = kFakes + "no_such_folder";
+
+uint32_t LoadFrom(const std::string& directory) {
+    return kaLoadModule0x010d0000(directory.c_str());
+}
 
 struct Call {
     std::string function;
@@ -26,18 +30,19 @@ struct Call {
     std::string text;
 };
 
-// The control functions of one recording library, reached in the very object the facade opens
-// (a second dlopen of the same file gives the same object).
-class FakeLogSys {
-  public:
+// The control functions of one recording library, in the very object the facade opens (a second
+// dlopen of the same file gives the same object).
+struct FakeLogSys {
     explicit FakeLogSys(const std::string& dir)
-        : handle_(dlopen((dir + "/libkaLogSys.so").c_str(), RTLD_NOW)) {}
+        : handle(dlopen((dir + "/libkaLogSys.so").c_str(), RTLD_NOW)) {}
     ~FakeLogSys() {
-        if (handle_ != nullptr) dlclose(handle_);
+        if (handle != nullptr) dlclose(handle);
     }
-    void* handle() const { return handle_; }
+    template <typename F>
+    F Get(const char* name) {
+        return reinterpret_cast<F>(dlsym(handle, name));
+    }
     void Reset() { Get<void (*)()>("fake_logsys_reset")(); }
-    void FillErrorBuffer(bool on) { Get<void (*)(int)>("fake_logsys_fill_error_buffer")(on); }
     std::vector<Call> Calls() {
         std::vector<Call> calls;
         for (int i = 0; i < Get<int (*)()>("fake_logsys_count")(); ++i) {
@@ -47,24 +52,18 @@ class FakeLogSys {
         }
         return calls;
     }
-
-  private:
-    template <typename F>
-    F Get(const char* name) {
-        return reinterpret_cast<F>(dlsym(handle_, name));
-    }
-    void* handle_;
+    void* handle;
 };
 
 class LoggingTest : public testing::Test {
-  protected:
+protected:
     void SetUp() override {
-        ASSERT_NE(fake.handle(), nullptr) << dlerror();
+        ASSERT_NE(fake.handle, nullptr) << dlerror();
         fake.Reset();
         ka::ForgetLogLibrary();
     }
     void TearDown() override { ka::ForgetLogLibrary(); }
-    void Load() { ASSERT_EQ(kaLoadModule0x010d0000(kRecording.c_str()), KA_OK); }
+    void Load() { ASSERT_EQ(LoadFrom(kRecording), KA_OK); }
 
     FakeLogSys fake{kRecording};
 };
@@ -78,31 +77,43 @@ struct Printer {
     size_t bufferSize;  // the cut is one below it
 };
 
-using S = const std::string&;
+#define KA_FORMATTED(f) [](int l, const std::string& t) { f(l, "%s", t.c_str()); }
+#define KA_CONST(f) [](int l, const std::string& t) { f(l, t.c_str()); }
 const std::vector<Printer> kPrinters = {
-    {"Print", [](int l, S t) { kalogPrint0x010d0000(l, "%s", t.c_str()); }, "kaLogDllLogPrint",
-     true, 2048},
-    {"PrintExtend", [](int l, S t) { kalogPrint_Extend0x010d0000(l, "%s", t.c_str()); },
-     "kaLogDllLogPrint", true, 5120},
-    {"PrintEx", [](int l, S t) { kalogPrintEx0x010d0000(l, "%s", t.c_str()); },
-     "kaLogDllLogPrintEx", false, 2048},
-    {"PrintL0", [](int l, S t) { kalogPrintL00x010d0000(l, "%s", t.c_str()); },
-     "kaLogDllLogPrintL0", true, 2048},
-    {"PrintL0Extend", [](int l, S t) { kalogPrintL0_Extend0x010d0000(l, "%s", t.c_str()); },
-     "kaLogDllLogPrintL0", true, 5120},
-    {"PrintConstStr", [](int l, S t) { kalogPrint_ConstStr0x010d0000(l, t.c_str()); },
-     "kaLogDllLogPrint", true, 4096},
-    {"PrintL0ConstStr", [](int l, S t) { kalogPrintL0_ConstStr0x010d0000(l, t.c_str()); },
-     "kaLogDllLogPrintL0", true, 4096}};
+    // clang-format off
+    {"Print", KA_FORMATTED(kalogPrint0x010d0000), "kaLogDllLogPrint", true, 2048},
+    {"Extend", KA_FORMATTED(kalogPrint_Extend0x010d0000), "kaLogDllLogPrint", true, 5120},
+    {"Ex", KA_FORMATTED(kalogPrintEx0x010d0000), "kaLogDllLogPrintEx", false, 2048},
+    {"L0", KA_FORMATTED(kalogPrintL00x010d0000), "kaLogDllLogPrintL0", true, 2048},
+    {"L0Extend", KA_FORMATTED(kalogPrintL0_Extend0x010d0000), "kaLogDllLogPrintL0", true, 5120},
+    {"ConstStr", KA_CONST(kalogPrint_ConstStr0x010d0000), "kaLogDllLogPrint", true, 4096},
+    {"L0ConstStr", KA_CONST(kalogPrintL0_ConstStr0x010d0000), "kaLogDllLogPrintL0", true, 4096},
+    // clang-format on
+};
 
-TEST_F(LoggingTest, BeforeLoadingEveryCallIsDropped) {
+// Before any load and after a failed one, every call is dropped; a second load replaces the first.
+TEST_F(LoggingTest, OnlyTheLastLoadedLibraryIsCalled) {
+    const auto expectAllDropped = [] {
+        for (const Printer& p : kPrinters) p.print(0, "dropped");
+        EXPECT_STREQ(kalogGetErrMsg0x010d0000(KA_ERR_MODULE_NOT_LOADED), "");
+        EXPECT_EQ(kalogInit0x010d0000(), 0u);
+        EXPECT_EQ(kalogUninit0x010d0000(), 0u);
+    };
     EXPECT_EQ(kaLoadModule0x010d0000(nullptr), KA_ERR_MODULE_NOT_LOADED);
     EXPECT_EQ(ka::CurrentLogLibrary().handle, nullptr);
-    for (const Printer& p : kPrinters) p.print(0, "dropped");
-    EXPECT_STREQ(kalogGetErrMsg0x010d0000(KA_ERR_MODULE_NOT_LOADED), "");
-    EXPECT_EQ(kalogInit0x010d0000(), 0u);
-    EXPECT_EQ(kalogUninit0x010d0000(), 0u);
+    expectAllDropped();
+
+    Load();
+    FakeLogSys other(kWithoutSetParam);
+    ASSERT_NE(other.handle, nullptr);
+    other.Reset();
+    ASSERT_EQ(LoadFrom(kWithoutSetParam), KA_OK);
+    kalogPrint0x010d0000(0, "to the second");
+    EXPECT_EQ(LoadFrom(kMissing), KA_ERR_MODULE_NOT_LOADED);
+    expectAllDropped();
     EXPECT_TRUE(fake.Calls().empty());
+    ASSERT_EQ(other.Calls().size(), 1u);
+    EXPECT_EQ(other.Calls()[0].text, "to the second\n");
 }
 
 class Family : public LoggingTest, public testing::WithParamInterface<Printer> {};
@@ -167,42 +178,33 @@ TEST_F(LoggingTest, ErrorMessageComesFromTheLibraryIntoOneClearedBuffer) {
     EXPECT_EQ(calls[1].level, 7);
 
     // A text that fills the buffer is still terminated, and the next call starts from zeros.
-    fake.FillErrorBuffer(true);
+    const auto fill = fake.Get<void (*)(int)>("fake_logsys_fill_error_buffer");
+    fill(1);
     EXPECT_EQ(std::string(kalogGetErrMsg0x010d0000(1)), std::string(2047, 'x'));
-    fake.FillErrorBuffer(false);
+    fill(0);
     EXPECT_STREQ(kalogGetErrMsg0x010d0000(2), "fake error 0x00000002");
 }
 
-TEST_F(LoggingTest, LoadResultAndEntryPoints) {
+// The optional kaLogDllSetParam may be missing; without the required kaLogDllLogPrint_rpc the
+// load fails, yet the entries that were found are used.
+TEST_F(LoggingTest, LoadResultAndWhatIsKept) {
     const struct {
-        const char* label;
         std::string directory;
         uint32_t expected;
-        bool handleKept, setParamFound, rpcFound;
-    } cases[] = {
-        {"WithoutFinalSlash", kRecording, KA_OK, true, true, true},
-        {"WithFinalSlash", kRecording + "/", KA_OK, true, true, true},
-        {"WithoutOptionalSetParam", kWithoutSetParam, KA_OK, true, false, true},
-        {"WithoutRequiredPrintRpc", kWithoutRpc, KA_ERR_MODULE_NOT_LOADED, true, true, false},
-        {"MissingDirectory", kFakes + "no_such_folder", KA_ERR_MODULE_NOT_LOADED, false, false,
-         false},
-        {"PathTooLong", "/" + std::string(1100, 'd'), KA_ERR_MODULE_NOT_LOADED, false, false,
-         false}};
+        bool kept;
+    } cases[] = {{kRecording, KA_OK, true},
+                 {kRecording + "/", KA_OK, true},
+                 {kWithoutSetParam, KA_OK, true},
+                 {kFakes + "logsys_without_rpc", KA_ERR_MODULE_NOT_LOADED, true},
+                 {kMissing, KA_ERR_MODULE_NOT_LOADED, false},
+                 {"/" + std::string(1100, 'd'), KA_ERR_MODULE_NOT_LOADED, false}};
     for (const auto& c : cases) {
-        SCOPED_TRACE(c.label);
+        SCOPED_TRACE(c.directory);
         ka::ForgetLogLibrary();
-        EXPECT_EQ(kaLoadModule0x010d0000(c.directory.c_str()), c.expected);
-        const ka::LogLibrary& log = ka::CurrentLogLibrary();
-        EXPECT_EQ(log.handle != nullptr, c.handleKept);
-        if (!c.handleKept) continue;
+        EXPECT_EQ(LoadFrom(c.directory), c.expected);
+        EXPECT_EQ(ka::CurrentLogLibrary().handle != nullptr, c.kept);
+        if (!c.kept) continue;
         FakeLogSys loaded(c.directory);
-        EXPECT_EQ(log.handle, loaded.handle());
-        EXPECT_EQ(log.setParam != nullptr, c.setParamFound);
-        EXPECT_EQ(log.printRpc != nullptr, c.rpcFound);
-        EXPECT_TRUE(log.init && log.getMaxLevel && log.print && log.printEx && log.printL0 &&
-                    log.uninit && log.getErrMsg);
-        EXPECT_EQ(log.maxLevel, 0);
-        // Whatever the result, the entries that were found are used.
         loaded.Reset();
         kalogPrint0x010d0000(0, "kept %d", 1);
         std::vector<Call> calls = loaded.Calls();
@@ -211,36 +213,19 @@ TEST_F(LoggingTest, LoadResultAndEntryPoints) {
     }
 }
 
-TEST_F(LoggingTest, ASecondLoadReplacesTheFirstAndAFailedOneSilencesLogging) {
-    Load();
-    FakeLogSys other(kWithoutSetParam);
-    ASSERT_NE(other.handle(), nullptr);
-    other.Reset();
-    ASSERT_EQ(kaLoadModule0x010d0000(kWithoutSetParam.c_str()), KA_OK);
-    kalogPrint0x010d0000(0, "to the second");
-    EXPECT_TRUE(fake.Calls().empty());
-    ASSERT_EQ(other.Calls().size(), 1u);
-    EXPECT_EQ(other.Calls()[0].text, "to the second\n");
-
-    EXPECT_EQ(kaLoadModule0x010d0000((kFakes + "no_such_folder").c_str()),
-              KA_ERR_MODULE_NOT_LOADED);
-    kalogPrintEx0x010d0000(0, "dropped");
-    EXPECT_STREQ(kalogGetErrMsg0x010d0000(1), "");
-    EXPECT_EQ(other.Calls().size(), 1u);
-}
-
 TEST(LibraryPath, OneSlashBetweenDirectoryAndFile) {
     const struct {
         const char* directory;
         const char* expected;  // null: refused
         size_t size;
-    } cases[] = {{"", "libkaLogSys.so", 64},
-                 {"/a/b", "/a/b/libkaLogSys.so", 64},
-                 {"/a/b/", "/a/b/libkaLogSys.so", 64},
-                 {"/", "/libkaLogSys.so", 64},
-                 {"/a", "/a/libkaLogSys.so", 18},
-                 {"/a", nullptr, 17},
-                 {nullptr, nullptr, 64}};  // "/a/libkaLogSys.so" needs 18 bytes
+    } cases[] = {
+        // clang-format off
+        {"", "libkaLogSys.so", 64}, {"/a/b", "/a/b/libkaLogSys.so", 64},
+        {"/a/b/", "/a/b/libkaLogSys.so", 64}, {"/", "/libkaLogSys.so", 64},
+        {"/a", "/a/libkaLogSys.so", 18}, {"/a", nullptr, 17},  // it needs 18 bytes
+        {nullptr, nullptr, 64},
+        // clang-format on
+    };
     for (const auto& c : cases) {
         char path[64];
         memset(path, '#', sizeof(path));

@@ -18,35 +18,31 @@ int64_t MsSince(Clock::time_point start) {
     return std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - start).count();
 }
 
+// This thread's CPU time by the kernel's count.
+int64_t CpuMs() {
+    timespec t = {};
+    clock_gettime(CLOCK_THREAD_CPUTIME_ID, &t);
+    return static_cast<int64_t>(t.tv_sec) * 1000 + t.tv_nsec / 1000000;
+}
+
 // Declared first: the tick base is taken by the process's first reading.
-TEST(Clocks, TickCountStartsAtZeroAndCountsUp) {
+TEST(Clocks, CountUpAndThreadTimeCountsOnlyThisThreadsWork) {
     EXPECT_EQ(0u, GetTickCountMs());
     const uint64_t ns = GetTimeNs();
+    const uint32_t threadMs = GetThreadTimeMs(nullptr);
     const auto start = Clock::now();
     EXPECT_EQ(0, SleepMs(30));
     EXPECT_GE(MsSince(start), 30);
     EXPECT_GE(GetTickCountMs(), 30u);
     EXPECT_LT(GetTickCountMs(), 5000u);
     EXPECT_GE(GetTimeNs() - ns, 30000000u);
-}
-
-TEST(Clocks, ThreadTimeCountsOnlyThisThreadsWork) {
-    const uint32_t before = GetThreadTimeMs(nullptr);
-    SleepMs(50);  // sleeping costs no CPU time
     const uint32_t afterSleep = GetThreadTimeMs(nullptr);
-    EXPECT_LT(afterSleep - before, 20u);
-    // Spin for 50 ms of this thread's CPU by the kernel's count (wall time says little on
-    // shared cores), with a wall-clock bound.
-    auto cpuMs = [] {
-        timespec t = {};
-        clock_gettime(CLOCK_THREAD_CPUTIME_ID, &t);
-        return static_cast<int64_t>(t.tv_sec) * 1000 + t.tv_nsec / 1000000;
-    };
-    const int64_t cpuStart = cpuMs();
-    const auto start = Clock::now();
-    while (cpuMs() - cpuStart < 50 && MsSince(start) < 5000) {
+    EXPECT_LT(afterSleep - threadMs, 20u);  // sleeping costs no CPU time
+    // 50 ms of CPU (wall time says little on shared cores), with a wall-clock bound.
+    const int64_t cpuStart = CpuMs();
+    while (CpuMs() - cpuStart < 50 && MsSince(start) < 5000) {
     }
-    EXPECT_NEAR(cpuMs() - cpuStart, GetThreadTimeMs(nullptr) - afterSleep, 5);
+    EXPECT_NEAR(CpuMs() - cpuStart, GetThreadTimeMs(nullptr) - afterSleep, 5);
 }
 
 TEST(Wait, EndsAtTheDeadlineOrWhenTheFlagHoldsOne) {
@@ -55,29 +51,27 @@ TEST(Wait, EndsAtTheDeadlineOrWhenTheFlagHoldsOne) {
         bool withFlag;
         KA_BOOL flag;
         int64_t atLeast, below;
+        int setAfterMs;  // another thread stores 1 then; -1: never
     } cases[] = {
-        {60, false, 0, 59, 5000},  // the deadline is in whole ticks
-        {60, true, 2, 59, 5000},   // only 1 stops
-        {10000, true, 1, 5, 2000},
-        {0, false, 0, 5, 5000},  // always one 5 ms step
+        {60, false, 0, 59, 5000, -1},  // the deadline is in whole ticks
+        {60, true, 2, 59, 5000, -1},   // only 1 stops
+        {10000, true, 1, 5, 2000, -1},  {0, false, 0, 5, 5000, -1},  // always one 5 ms step
+        {20000, true, 0, 45, 5000, 50},
     };
     for (const auto& c : cases) {
+        SCOPED_TRACE(std::to_string(c.ms) + " flag " + std::to_string(c.flag));
         KA_BOOL flag = c.flag;
+        std::thread setter([&flag, &c] {
+            if (c.setAfterMs < 0) return;
+            std::this_thread::sleep_for(std::chrono::milliseconds(c.setAfterMs));
+            __atomic_store_n(&flag, 1, __ATOMIC_RELAXED);
+        });
         const auto start = Clock::now();
         WaitMs(c.ms, c.withFlag ? &flag : nullptr);
-        EXPECT_GE(MsSince(start), c.atLeast) << c.ms << " flag " << c.flag;
-        EXPECT_LT(MsSince(start), c.below) << c.ms << " flag " << c.flag;
+        setter.join();
+        EXPECT_GE(MsSince(start), c.atLeast);
+        EXPECT_LT(MsSince(start), c.below);
     }
-
-    KA_BOOL flag = 0;
-    const auto start = Clock::now();
-    std::thread setter([&flag] {
-        std::this_thread::sleep_for(std::chrono::milliseconds(50));
-        __atomic_store_n(&flag, 1, __ATOMIC_RELAXED);
-    });
-    WaitMs(20000, &flag);
-    setter.join();
-    EXPECT_LT(MsSince(start), 5000);
 }
 
 TEST(AppPath, PathAndDirectoryOfTheTestBinary) {
@@ -133,6 +127,7 @@ TEST(Cpu, LoadMeasuresAndStopsEarlyWithThePreviousFigures) {
     EXPECT_LE(system + user, 100u);
     EXPECT_GT(system + user, 0u);  // one thread spun for most of the second
 
+    // Not running again: the measured figures.
     const uint32_t measured[] = {system, user};
     running = 0;
     EXPECT_EQ(0u, GetCpuLoad(&system, &user, &running, 1, 100));
@@ -140,15 +135,13 @@ TEST(Cpu, LoadMeasuresAndStopsEarlyWithThePreviousFigures) {
     EXPECT_EQ(measured[1], user);
 }
 
-TEST(Cpu, FrequencyOnlyWhenTheKernelReportsIt) {
+TEST(System, FrequencyEpochSecondsAndName) {
+    // The frequency ratio only when the kernel reports a maximum frequency.
     uint32_t ratio = 12345678;
     const bool known = access("/sys/devices/system/cpu/cpu0/cpufreq/cpuinfo_max_freq", R_OK) == 0;
     EXPECT_EQ(known ? 1 : 0, GetCpuFrequency(&ratio));
     EXPECT_TRUE(known ? ratio <= 20000u : ratio == 12345678u) << ratio;
     EXPECT_EQ(known ? 1 : 0, GetCpuFrequency(nullptr));
-}
-
-TEST(System, EpochSecondsAndName) {
     const int64_t now = static_cast<int64_t>(time(nullptr));
     EXPECT_GE(GetTimeSeconds(), now);
     EXPECT_LE(GetTimeSeconds(), now + 5);

@@ -12,31 +12,24 @@
 namespace {
 
 TEST(ParseCData, ExtractsContent) {
+    constexpr unsigned int kOk = KA_OK, kFail = KA_ERR_LOAD_FAILED;
     struct {
         const char* source;
         int size;
         const char* expected;  // null: the destination must stay untouched
         unsigned int result;
     } const cases[] = {
-        {"![CDATA[  a?x=1&amp;y=2  ]]", 64, "a?x=1&amp;y=2", KA_OK},
-        {"![CDATA[]]", 16, "", KA_OK},
-        {"![CDATA[   ]]", 16, "", KA_OK},
-        {"![CDATA[ \t\n\v\f\rx \t\n\v\f\r]]", 32, "x", KA_OK},
-        {"![CDATA[ a  b ]]", 32, "a  b", KA_OK},
-        {"![CDATA[\xC2\xA0x\xA0]]", 32, "\xC2\xA0x\xA0", KA_OK},
-        {"![CDATA[a]]]]", 32, "a]]", KA_OK},
-        {"![CDATA[abc]]", 4, "abc", KA_OK},
-        {"![CDATA[abcdef]]", 4, "abc", KA_ERR_LOAD_FAILED},
-        {"![CDATA[abc]]", 1, "", KA_ERR_LOAD_FAILED},
-        {"![CDATA[abc", 32, "![CDATA[abc", KA_ERR_LOAD_FAILED},
-        {"![CDATA[abc]", 32, "![CDATA[abc]", KA_ERR_LOAD_FAILED},
-        {"abc]]", 32, "abc]]", KA_ERR_LOAD_FAILED},
-        {"![cdata[abc]]", 32, "![cdata[abc]]", KA_ERR_LOAD_FAILED},
-        {"hello world", 6, "hello", KA_ERR_LOAD_FAILED},
-        {"", 8, "", KA_ERR_LOAD_FAILED},
-        {nullptr, 8, nullptr, KA_ERR_LOAD_FAILED},
-        {"![CDATA[a]]", 0, nullptr, KA_ERR_LOAD_FAILED},
-        {"![CDATA[a]]", -3, nullptr, KA_ERR_LOAD_FAILED},
+        // clang-format off
+        {"![CDATA[  a?x=1&amp;y=2  ]]", 64, "a?x=1&amp;y=2", kOk}, {"![CDATA[]]", 16, "", kOk},
+        {"![CDATA[   ]]", 16, "", kOk}, {"![CDATA[ \t\n\v\f\rx \t\n\v\f\r]]", 32, "x", kOk},
+        {"![CDATA[ a  b ]]", 32, "a  b", kOk}, {"![CDATA[a]]]]", 32, "a]]", kOk},
+        {"![CDATA[\xC2\xA0x\xA0]]", 32, "\xC2\xA0x\xA0", kOk}, {"![CDATA[abc]]", 4, "abc", kOk},
+        {"![CDATA[abcdef]]", 4, "abc", kFail}, {"![CDATA[abc]]", 1, "", kFail},
+        {"![CDATA[abc", 32, "![CDATA[abc", kFail}, {"![CDATA[abc]", 32, "![CDATA[abc]", kFail},
+        {"abc]]", 32, "abc]]", kFail}, {"![cdata[abc]]", 32, "![cdata[abc]]", kFail},
+        {"hello world", 6, "hello", kFail}, {"", 8, "", kFail}, {nullptr, 8, nullptr, kFail},
+        {"![CDATA[a]]", 0, nullptr, kFail}, {"![CDATA[a]]", -3, nullptr, kFail},
+        // clang-format on
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(::testing::Message() << (c.source ? c.source : "null") << ", " << c.size);
@@ -58,20 +51,12 @@ TEST(ParseCData, ExtractsContent) {
 
 TEST(UnescapeAmp, DecodesEachOccurrenceOnce) {
     const std::pair<const char*, const char*> cases[] = {
-        {"&amp;", "&"},
-        {"&amp;amp;", "&amp;"},
-        {"&amp;amp;amp;", "&amp;amp;"},
-        {"a&amp", "a&amp"},
-        {"&amp", "&amp"},
-        {"", ""},
-        {"a?x=1&amp;y=2", "a?x=1&y=2"},
-        {"&amp;&amp;&amp;", "&&&"},
-        {"a&amp;amp;b&amp;", "a&amp;b&"},
-        {"&&amp;", "&&"},
-        {"&amp;&", "&&"},
-        {"&lt;&amp;gt;&#38;", "&lt;&gt;&#38;"},
-        {"&AMP;", "&AMP;"},
-        {"&amp ;", "&amp ;"},
+        // clang-format off
+        {"&amp;", "&"}, {"&amp;amp;", "&amp;"}, {"&amp;amp;amp;", "&amp;amp;"}, {"a&amp", "a&amp"},
+        {"", ""}, {"a?x=1&amp;y=2", "a?x=1&y=2"}, {"&amp;&amp;&amp;", "&&&"},
+        {"a&amp;amp;b&amp;", "a&amp;b&"}, {"&&amp;", "&&"}, {"&amp;&", "&&"},
+        {"&lt;&amp;gt;&#38;", "&lt;&gt;&#38;"}, {"&AMP;", "&AMP;"}, {"&amp ;", "&amp ;"},
+        // clang-format on
     };
     for (const auto& [input, expected] : cases) {
         std::string text = input;
@@ -79,35 +64,23 @@ TEST(UnescapeAmp, DecodesEachOccurrenceOnce) {
         EXPECT_STREQ(text.c_str(), expected) << input;
     }
     EXPECT_EQ(unescape_amp(nullptr), 0);
-}
-
-// A decoding that moved the whole tail at every occurrence would not finish here.
-TEST(UnescapeAmp, ManyOccurrencesInOneString) {
-    std::string text;
-    for (int i = 0; i < 200000; ++i) text += "&amp;";
-    unescape_amp(text.data());
-    EXPECT_EQ(std::string(text.c_str()), std::string(200000, '&'));
+    // A decoding that moved the whole tail at every occurrence would not finish here.
+    std::string many;
+    for (int i = 0; i < 200000; ++i) many += "&amp;";
+    unescape_amp(many.data());
+    EXPECT_EQ(std::string(many.c_str()), std::string(200000, '&'));
 }
 
 TEST(String2Time, Milliseconds) {
     const std::pair<const char*, unsigned int> cases[] = {
-        {"00:00:30", 30000u},
-        {"01:02:03.004", 3723004u},
-        {"00:00:01.5", 1005u},
-        {"00:00:01.5000", 1500u},
-        {"12:34", 45240000u},
-        {"1:2:3.4", 3723004u},
-        {"99:99:99.999", 362439999u},
-        {"+1:00:00", 3600000u},
-        {"-1:00:00", 0u - 3600000u},
+        // clang-format off
+        {"00:00:30", 30000u}, {"01:02:03.004", 3723004u}, {"00:00:01.5", 1005u},
+        {"00:00:01.5000", 1500u}, {"12:34", 45240000u}, {"1:2:3.4", 3723004u},
+        {"99:99:99.999", 362439999u}, {"+1:00:00", 3600000u}, {"-1:00:00", 0u - 3600000u},
         // The sign takes one of the two places: "+0" is read, then ':' does not match '1'.
-        {"+01:00:00", 0u},
-        {" 00:00:05", 5000u},
-        {"123:00:00", 43200000u},
-        {"01", 3600000u},
-        {"00:01:00,500", 60000u},
-        {"abc", 0u},
-        {"", 0u},
+        {"+01:00:00", 0u}, {" 00:00:05", 5000u}, {"123:00:00", 43200000u}, {"01", 3600000u},
+        {"00:01:00,500", 60000u}, {"abc", 0u}, {"", 0u},
+        // clang-format on
     };
     for (const auto& [text, expected] : cases) {
         EXPECT_EQ(string2time(text, static_cast<int>(strlen(text)) + 1), expected) << text;

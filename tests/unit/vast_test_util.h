@@ -18,7 +18,7 @@
 
 namespace vasttest {
 
-// Open takes the working path by pointer and keeps it: a buffer that lives for the whole run.
+// Open keeps the working path by pointer: a buffer that lives for the whole run.
 inline char* ModulesDir() {
     static char dir[1024];
     if (dir[0] == '\0') std::strncpy(dir, KA_MODULES_DIR, sizeof(dir) - 1);
@@ -30,10 +30,6 @@ inline std::string ReadFile(const std::string& path) {
     std::ostringstream out;
     out << in.rdbuf();
     return out.str();
-}
-
-inline std::string DataFile(const char* name) {
-    return ReadFile(std::string(KA_TEST_DATA_DIR) + "vast/" + name);
 }
 
 template <typename T>
@@ -79,10 +75,10 @@ inline void ExpectCountsMatch(const VastAdData& data) {
             EXPECT_EQ(l.videoClicksCount, Length(l.videoClicks));
             EXPECT_EQ(l.adParametersCount, Length(l.adParameters));
             EXPECT_EQ(l.iconCount, Length(l.icons));
-            if (l.videoClicks != nullptr) {
-                EXPECT_EQ(l.videoClicks->clickThroughCount, Length(l.videoClicks->clickThroughs));
-                EXPECT_EQ(l.videoClicks->clickTrackingCount, Length(l.videoClicks->clickTrackings));
-                EXPECT_EQ(l.videoClicks->customClickCount, Length(l.videoClicks->customClicks));
+            if (const AdVideoClicks* v = l.videoClicks) {
+                EXPECT_EQ(v->clickThroughCount, Length(v->clickThroughs));
+                EXPECT_EQ(v->clickTrackingCount, Length(v->clickTrackings));
+                EXPECT_EQ(v->customClickCount, Length(v->customClicks));
             }
         }
     }
@@ -93,8 +89,7 @@ protected:
     void SetUp() override {
         mObjectsBefore = CSDKObject::g_kaSDKObjectNum;
         mParser = new CVASTParser();
-        // The records exactly as read: at its depth limit a parser follows no wrapper, so the
-        // documents' made-up VASTAdTagURIs are never fetched.
+        // At its depth limit a parser follows no wrapper: the made-up URIs are never fetched.
         mParser->mMaxDepth = 0;
         ASSERT_EQ(mParser->Open(ModulesDir()), 0u) << "XML module not found in " << ModulesDir();
     }
@@ -108,7 +103,7 @@ protected:
         EXPECT_EQ(CSDKObject::g_kaSDKObjectNum, mObjectsBefore);
     }
 
-    // Runs a whole document through Process; the counts are checked after every parse.
+    // Runs a whole document through Process (which closes the parser); counts checked each time.
     unsigned int Parse(const std::string& document) {
         std::string buffer = document;
         unsigned int result =
@@ -116,13 +111,11 @@ protected:
         ExpectCountsMatch(mParser->mVastAdData);
         return result;
     }
-
-    // Opens again (Process closes the parser) and parses after what is already held.
+    // Opens again and parses after what is already held.
     unsigned int Reparse(const std::string& document) {
         EXPECT_EQ(mParser->Open(ModulesDir()), 0u);
         return Parse(document);
     }
-
     // Drops what is held, opens again and parses: one case of a table.
     unsigned int Fresh(const std::string& document) {
         mParser->ReleaseVastAdData(&mParser->mVastAdData);
@@ -131,36 +124,28 @@ protected:
 
     VastAdData& Data() { return mParser->mVastAdData; }
     AdData* Ad(uint32_t index) { return Nth(Data().firstAd, index); }
-    AdInLine* InLine(uint32_t index) {
+    template <typename Body>
+    Body* BodyOf(uint32_t index, uint32_t type) {
         AdData* ad = Ad(index);
-        return ad == nullptr || ad->type != AD_TYPE_INLINE ? nullptr
-                                                           : static_cast<AdInLine*>(ad->body);
+        return ad == nullptr || ad->type != type ? nullptr : static_cast<Body*>(ad->body);
     }
-    AdWrapper* Wrapper(uint32_t index) {
-        AdData* ad = Ad(index);
-        return ad == nullptr || ad->type != AD_TYPE_WRAPPER ? nullptr
-                                                            : static_cast<AdWrapper*>(ad->body);
-    }
+    AdInLine* InLine(uint32_t index) { return BodyOf<AdInLine>(index, AD_TYPE_INLINE); }
+    AdWrapper* Wrapper(uint32_t index) { return BodyOf<AdWrapper>(index, AD_TYPE_WRAPPER); }
     // The first creative of the first InLine ad of a document.
-    AdCreative* FirstCreative() {
-        AdInLine* inLine = InLine(0);
-        return inLine == nullptr ? nullptr : inLine->creatives;
-    }
+    AdCreative* FirstCreative() { return InLine(0) == nullptr ? nullptr : InLine(0)->creatives; }
 
     CVASTParser* mParser = nullptr;
     int mObjectsBefore = 0;
 };
 
-// A VAST document with one InLine ad whose InLine holds the given content.
-inline std::string InLineDocument(const std::string& inLineContent) {
-    return "<VAST version=\"3.0\"><Ad id=\"a\"><InLine>" + inLineContent + "</InLine></Ad></VAST>";
+// A VAST document with one InLine ad holding the given content.
+inline std::string InLineDocument(const std::string& content) {
+    return "<VAST version=\"3.0\"><Ad id=\"a\"><InLine>" + content + "</InLine></Ad></VAST>";
 }
 
-// A VAST document with one InLine ad holding one Creative whose Linear has the given
-// attributes and content.
-inline std::string LinearDocument(const std::string& linearAttributes,
-                                  const std::string& linearContent) {
-    return InLineDocument("<Creatives><Creative><Linear " + linearAttributes + ">" + linearContent +
+// One InLine ad with one Creative whose Linear has the given attributes and content.
+inline std::string LinearDocument(const std::string& attributes, const std::string& content) {
+    return InLineDocument("<Creatives><Creative><Linear " + attributes + ">" + content +
                           "</Linear></Creative></Creatives>");
 }
 

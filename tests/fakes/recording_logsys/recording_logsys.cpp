@@ -41,24 +41,17 @@ void fake_logsys_fill_error_buffer(int on) { g_fillErrorBuffer = on != 0; }
 int kaLogDllInit() { return Record("kaLogDllInit", 0, ""); }
 int kaLogDllGetMaxLevel() { return Record("kaLogDllGetMaxLevel", 0, ""); }
 int kaLogDllUninit() { return Record("kaLogDllUninit", 0, ""); }
+#define KA_FAKE_PRINT(name) \
+    int name(int level, const char* text) { return Record(#name, level, text); }
 #if !defined(KA_FAKE_WITHOUT_RPC)
-int kaLogDllLogPrint_rpc(int level, const char* text) {
-    return Record("kaLogDllLogPrint_rpc", level, text);
-}
+KA_FAKE_PRINT(kaLogDllLogPrint_rpc)
 #endif
 #if !defined(KA_FAKE_WITHOUT_SETPARAM)
 int kaLogDllSetParam(int id, void* /*value*/) { return Record("kaLogDllSetParam", id, ""); }
 #endif
-
-int kaLogDllLogPrint(int level, const char* text) {
-    return Record("kaLogDllLogPrint", level, text);
-}
-int kaLogDllLogPrintEx(int level, const char* text) {
-    return Record("kaLogDllLogPrintEx", level, text);
-}
-int kaLogDllLogPrintL0(int level, const char* text) {
-    return Record("kaLogDllLogPrintL0", level, text);
-}
+KA_FAKE_PRINT(kaLogDllLogPrint)
+KA_FAKE_PRINT(kaLogDllLogPrintEx)
+KA_FAKE_PRINT(kaLogDllLogPrintL0)
 
 // The facade passes a 2048-byte buffer.
 int kaLogDllLogGetErrMsg(uint32_t code, char* buffer) {
