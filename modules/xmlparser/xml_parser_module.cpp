@@ -23,8 +23,7 @@
 // - Parsing is linear in the buffer's size and never recurses by document depth, and neither
 //   does the pass over the loaded tree.
 // - GetNextAttribute walks an element's attributes; an attribute that is not the node's own
-//   ends the walk. SetParam, GetParam and slot 12 do nothing
-//   and answer kErrUnsupported.
+//   ends the walk. SetParam, GetParam and slot 12 do nothing and answer kErrUnsupported.
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
