@@ -115,11 +115,11 @@ bool ElementIndex::for_each(pugi::xml_node& node) {
         case pugi::node_cdata: {
             Element* parent = level.parent;
             // Text at the top level is refused.
-            if (parent == nullptr || !PrepareText(node)) return !(mRefused = true);
-            const char* value = node.value();
-            if (parent->text == nullptr && value[0] != '\0') {
-                parent->text = value;
-                parent->textLength = static_cast<int>(strlen(value));
+            size_t length = 0;
+            if (parent == nullptr || !PrepareText(node, &length)) return !(mRefused = true);
+            if (parent->text == nullptr && length > 0) {
+                parent->text = node.value();
+                parent->textLength = static_cast<int>(length);
             }
             return true;
         }
@@ -164,9 +164,10 @@ bool ElementIndex::AddElement(pugi::xml_node node, Level& level) {
     return true;
 }
 
-bool ElementIndex::PrepareText(pugi::xml_node node) {
+bool ElementIndex::PrepareText(pugi::xml_node node, size_t* prepared) {
     const char* value = node.value();
     const size_t length = strlen(value);
+    *prepared = length;
     if (node.type() == pugi::node_pcdata) {
         // A text keeps its trimmed value. pugixml may write the new value over the old one,
         // so it goes through the scratch buffer rather than straight from the value itself.
@@ -175,6 +176,7 @@ bool ElementIndex::PrepareText(pugi::xml_node node) {
         size_t end = length;
         while (end > begin && IsSpace(value[end - 1])) --end;
         if (begin == 0 && end == length) return true;
+        *prepared = end - begin;
         if (begin == end) return node.set_value("", 0);
         mScratch.assign(value + begin, value + end);
         return node.set_value(mScratch.data(), mScratch.size());
@@ -184,6 +186,7 @@ bool ElementIndex::PrepareText(pugi::xml_node node) {
     mScratch.insert(mScratch.end(), kCDataOpen, kCDataOpen + kCDataOpenLength);
     mScratch.insert(mScratch.end(), value, value + length);
     mScratch.insert(mScratch.end(), kCDataClose, kCDataClose + kCDataCloseLength);
+    *prepared = mScratch.size();
     return node.set_value(mScratch.data(), mScratch.size());
 }
 

@@ -75,8 +75,9 @@ private:
     };
     bool for_each(pugi::xml_node& node) override;
     bool AddElement(pugi::xml_node node, Level& level);
-    // Trims a text node or wraps a CDATA one in place; false when memory ran out.
-    bool PrepareText(pugi::xml_node node);
+    // Trims a text node or wraps a CDATA one in place and gives the new value's length; false
+    // when memory ran out.
+    bool PrepareText(pugi::xml_node node, size_t* prepared);
 
     IndexMemory mMemory;
     Element* mRoot = nullptr;
