@@ -33,8 +33,10 @@ const VMAPParserAPI& Api() {
     return api;
 }
 
-void AllowLocalFiles(bool allow) {
-    // The same file the library loads, hence the same instance; it stays loaded.
+namespace {
+
+// The same file the library loads, hence the same instance; it stays loaded.
+SourceIOApi& SourceModule() {
     static SourceIOApi* api = [] {
         const std::string path = std::string(KA_MODULES_DIR) + "libkaSourceIO.so";
         void* module = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
@@ -44,9 +46,23 @@ void AllowLocalFiles(bool allow) {
         if (entry == nullptr || entry(&table) != 0 || table.SetParam == nullptr) abort();
         return &table;
     }();
-    const uint32_t kAllowFiles = 0x7a000003;
+    return *api;
+}
+
+constexpr uint32_t kAllowFiles = 0x7a000003;
+constexpr uint32_t kFileBaseDir = 0x7a000004;
+
+}  // namespace
+
+void AllowLocalFiles(bool allow) {
     uint32_t value = allow ? 1 : 0;
-    api->SetParam(nullptr, kAllowFiles, &value);
+    SourceModule().SetParam(nullptr, kAllowFiles, &value);
+    if (!allow) SourceModule().SetParam(nullptr, kFileBaseDir, const_cast<char*>(""));
+}
+
+void AllowLocalFilesBelow(const std::string& folder) {
+    AllowLocalFiles(true);
+    SourceModule().SetParam(nullptr, kFileBaseDir, const_cast<char*>(folder.c_str()));
 }
 
 std::vector<char> ReadFile(const std::string& path) {

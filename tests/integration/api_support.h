@@ -19,6 +19,8 @@ void* LibrarySymbol(const char* name);
 // Lets the source-IO module instance the library uses read local files, so that wrapped
 // documents in the test data are fetched without a network.
 void AllowLocalFiles(bool allow);
+// The same, with relative names read below folder (which ends with "/").
+void AllowLocalFilesBelow(const std::string& folder);
 
 std::vector<char> ReadFile(const std::string& path);  // empty when unreadable
 std::vector<char> ReadTestData(const std::string& relative);
