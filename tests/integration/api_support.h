@@ -54,7 +54,7 @@ private:
 AdBreak* BreakById(const AdInfo* info, const char* id);  // the first match, or null
 // A VAST document of one Wrapper ad "outer" naming uri; by default a file in the test data.
 std::string WrapperTo(const std::string& uri = std::string(KA_TEST_DATA_DIR) +
-                                               "handoff/wrapped_inline.xml");
+                                               "documents/vast/wrapped_inline.wrapped.xml");
 template <typename Record>
 size_t Length(const Record* first) {
     size_t n = 0;
