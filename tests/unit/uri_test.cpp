@@ -116,8 +116,8 @@ TEST(Uri, LongInputsAreCutAt2047) {
                   (Strings{s.bytes, a.bytes, p.bytes, q.bytes, h.bytes}));
         RemoveDotSegments(dotFree.bytes, &segments[0]);
         EXPECT_EQ(segments.substr(0, kUrlSize - 1), dotFree.bytes);
-        GeneateURI(s.bytes, nullptr, a.bytes, nullptr, nullptr, generated.bytes);
-        EXPECT_EQ(("s:" + ref).substr(0, kUrlSize - 1), generated.bytes);
+        GeneateURI(nullptr, nullptr, a.bytes, nullptr, nullptr, generated.bytes);
+        EXPECT_EQ(cut, generated.bytes);
         EXPECT_TRUE(a.Guarded() && p.Guarded() && dotFree.Guarded() && generated.Guarded());
     }
     std::string ref = "../" + std::string(6000, 'g') + "?" + std::string(6000, 'q');
