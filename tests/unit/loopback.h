@@ -1,6 +1,6 @@
-// What the download and wrapper-chain tests share: an HTTP server on 127.0.0.1 run by this
-// process, and the source-IO stand-in as the host holds it (the same loaded object the library
-// reaches, so its module-wide settings apply to the library's downloads).
+// An HTTP server on 127.0.0.1 run by the test process, and the source-IO stand-in as the host
+// holds it: the same loaded object the library reaches, so its module-wide settings apply to the
+// library's downloads.
 #pragma once
 
 #include <dlfcn.h>
@@ -8,9 +8,6 @@
 #include <httplib.h>
 
 #include <atomic>
-#include <chrono>
-#include <cstring>
-#include <functional>
 #include <map>
 #include <mutex>
 #include <string>
@@ -20,42 +17,32 @@
 
 namespace loopback {
 
-// Serves what Put registers at /d/NAME (404 otherwise) and N spaces at /size/N; holds /stall...
-// requests until the server is destroyed (ten seconds at most). Counts requests by path.
+// Serves what Put registers (404 otherwise), N spaces at /size/N, a redirect to the "to"
+// parameter at /redirect and the User-Agent at /agent; holds /stall... requests until the server
+// is destroyed (ten seconds at most). Counts requests by path as they arrive.
 class Server {
 public:
-    explicit Server(const std::function<void(httplib::Server&)>& moreRoutes = nullptr) {
-        using Req = const httplib::Request&;
-        using Res = httplib::Response&;
-        server_.Get("/d/(.*)", [this](Req req, Res res) {
-            std::lock_guard<std::mutex> lock(mutex_);
-            counts_[req.path]++;
-            auto found = docs_.find(req.matches[1]);
-            if (found == docs_.end())
-                res.status = 404;
-            else
-                res.set_content(found->second, "application/xml");
-        });
-        server_.Get("/stall(/.*)?", [this](Req req, Res res) {
-            Requests(req.path, 1);
-            const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(10);
-            while (!ending_ && std::chrono::steady_clock::now() < deadline) {
+    Server() {
+        server_.Get(".*", [this](const httplib::Request& req, httplib::Response& res) {
+            std::unique_lock<std::mutex> lock(mutex_);
+            const std::string& path = req.path;
+            counts_[path]++;
+            if (docs_.count(path) != 0) res.set_content(docs_[path], "application/xml");
+            res.status = docs_.count(path) != 0 || path.rfind("/d/", 0) != 0 ? 200 : 404;
+            lock.unlock();
+            if (path.rfind("/size/", 0) == 0)
+                res.set_content(std::string(std::stoul(path.substr(6)), ' '), "text/xml");
+            if (path == "/redirect") res.set_redirect(req.get_param_value("to"));
+            if (path == "/agent") res.set_content(req.get_header_value("User-Agent"), "text/plain");
+            for (int ms = 0; path.rfind("/stall", 0) == 0 && !ending_ && ms < 10000; ms += 2) {
                 std::this_thread::sleep_for(std::chrono::milliseconds(2));
             }
-            res.set_content("late", "text/plain");
         });
-        server_.Get("/size/(\\d+)", [](Req req, Res res) {
-            res.set_content(std::string(std::stoul(req.matches[1]), ' '), "application/xml");
-        });
-        if (moreRoutes) moreRoutes(server_);
         port_ = server_.bind_to_any_port("127.0.0.1");
-        if (port_ > 0) {
-            thread_ = std::thread([this] { server_.listen_after_bind(); });
-            // stop() only reaches a server that is already running.
-            const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(5);
-            while (!server_.is_running() && std::chrono::steady_clock::now() < deadline) {
-                std::this_thread::sleep_for(std::chrono::milliseconds(1));
-            }
+        if (port_ > 0) thread_ = std::thread([this] { server_.listen_after_bind(); });
+        // stop() only reaches a server that is already running.
+        for (int ms = 0; port_ > 0 && !server_.is_running() && ms < 5000; ++ms) {
+            std::this_thread::sleep_for(std::chrono::milliseconds(1));
         }
     }
     ~Server() {
@@ -70,16 +57,15 @@ public:
     // Registers a document; returns its URL.
     std::string Put(const std::string& name, const std::string& body) {
         std::lock_guard<std::mutex> lock(mutex_);
-        docs_[name] = body;
+        docs_["/d/" + name] = body;
         return Url("/d/" + name);
     }
-    // Requests of a path so far (after adding more); "" sums every path.
-    int Requests(const std::string& path, int more = 0) {
+    // Requests of a path so far; "" sums every path.
+    int Requests(const std::string& path = "") {
         std::lock_guard<std::mutex> lock(mutex_);
-        int total = counts_[path] += more;
-        if (path.empty()) {
-            for (const auto& entry : counts_) total += entry.second;
-        }
+        int total = 0;
+        for (const auto& entry : counts_)
+            total += path.empty() || entry.first == path ? entry.second : 0;
         return total;
     }
 
@@ -99,13 +85,10 @@ inline std::string RefusedUrl() { return Server().Url("/d/x"); }
 // The source-IO module's table, loaded once from the modules folder.
 inline SourceIOApi& SourceIo() {
     static SourceIOApi api = [] {
-        SourceIOApi table;
-        memset(&table, 0, sizeof(table));
+        SourceIOApi table = {};
         void* module = dlopen(KA_MODULES_DIR "libkaSourceIO.so", RTLD_NOW);
-        auto entry = module == nullptr
-                         ? nullptr
-                         : reinterpret_cast<KaGetSourceIOAPIFn>(dlsym(module, "kaGetSourceIOAPI"));
-        if (entry != nullptr) entry(&table);
+        void* entry = module != nullptr ? dlsym(module, "kaGetSourceIOAPI") : nullptr;
+        if (entry != nullptr) reinterpret_cast<KaGetSourceIOAPIFn>(entry)(&table);
         return table;
     }();
     return api;

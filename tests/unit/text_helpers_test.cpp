@@ -1,9 +1,10 @@
+// CDATA unwrapping, "&amp;" decoding and clock times; the cases are in tests/data/text_cases.txt.
 #include "xml/text_helpers.h"
 
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <cstring>
+#include <fstream>
 #include <string>
 #include <vector>
 
@@ -11,85 +12,64 @@
 
 namespace {
 
-TEST(ParseCData, ExtractsContent) {
-    constexpr unsigned int kOk = KA_OK, kFail = KA_ERR_LOAD_FAILED;
-    struct {
-        const char* source;
-        int size;
-        const char* expected;  // null: the destination must stay untouched
-        unsigned int result;
-    } const cases[] = {
-        // clang-format off
-        {"![CDATA[  a?x=1&amp;y=2  ]]", 64, "a?x=1&amp;y=2", kOk}, {"![CDATA[]]", 16, "", kOk},
-        {"![CDATA[   ]]", 16, "", kOk}, {"![CDATA[ \t\n\v\f\rx \t\n\v\f\r]]", 32, "x", kOk},
-        {"![CDATA[ a  b ]]", 32, "a  b", kOk}, {"![CDATA[a]]]]", 32, "a]]", kOk},
-        {"![CDATA[\xC2\xA0x\xA0]]", 32, "\xC2\xA0x\xA0", kOk}, {"![CDATA[abc]]", 4, "abc", kOk},
-        {"![CDATA[abcdef]]", 4, "abc", kFail}, {"![CDATA[abc]]", 1, "", kFail},
-        {"![CDATA[abc", 32, "![CDATA[abc", kFail}, {"![CDATA[abc]", 32, "![CDATA[abc]", kFail},
-        {"abc]]", 32, "abc]]", kFail}, {"![cdata[abc]]", 32, "![cdata[abc]]", kFail},
-        {"hello world", 6, "hello", kFail}, {"", 8, "", kFail}, {nullptr, 8, nullptr, kFail},
-        {"![CDATA[a]]", 0, nullptr, kFail}, {"![CDATA[a]]", -3, nullptr, kFail},
-        // clang-format on
-    };
-    for (const auto& c : cases) {
-        SCOPED_TRACE(::testing::Message() << (c.source ? c.source : "null") << ", " << c.size);
-        std::vector<char> dst(static_cast<size_t>(std::max(c.size, 0)) + 8, 'Z');
-        EXPECT_EQ(parse_cdata(dst.data(), c.source, c.size), c.result);
-        if (c.expected == nullptr) {
-            EXPECT_EQ(std::count(dst.begin(), dst.end(), 'Z'), std::ptrdiff_t(dst.size()));
-            continue;
+TEST(TextHelpers, Cases) {
+    std::ifstream file(KA_TEST_DATA_DIR "text_cases.txt");
+    std::string line;
+    int cases = 0;
+    while (std::getline(file, line)) {
+        if (line.empty() || line[0] == '#') continue;
+        SCOPED_TRACE(line);
+        std::vector<std::string> f;
+        for (size_t at = 0, end = 0; end != std::string::npos; at = end + 3) {
+            end = line.find(" | ", at);
+            std::string field = line.substr(at, end - at);
+            for (size_t x = field.find("\\x"); x != std::string::npos;
+                 x = field.find("\\x", x + 1)) {
+                field.replace(x, 4, 1,
+                              static_cast<char>(std::stoi(field.substr(x + 2, 2), nullptr, 16)));
+            }
+            f.push_back(field == "\"\"" ? "" : field);
         }
-        EXPECT_STREQ(dst.data(), c.expected);
-        // A failed copy pads the destination with NUL; nothing past its size is written.
-        for (size_t i = strlen(c.expected); i < dst.size(); ++i) {
-            const bool inside = i < static_cast<size_t>(c.size);
-            if (inside && c.result == KA_OK) continue;
-            EXPECT_EQ(dst[i], inside ? '\0' : 'Z') << i;
+        ++cases;
+        if (f[0] == "cdata") {
+            const size_t size = std::stoul(f[2]);
+            std::vector<char> dst(size + 8, 'Z');
+            EXPECT_EQ(f[3] == "ok" ? KA_OK : KA_ERR_LOAD_FAILED,
+                      parse_cdata(dst.data(), f[1].c_str(), int(size)));
+            EXPECT_EQ(f[4], dst.data());
+            // A failed copy pads the destination with NUL; nothing past its size is written.
+            for (size_t i = f[4].size(); i < dst.size(); ++i) {
+                if (i < size && f[3] == "ok") continue;
+                EXPECT_EQ(i < size ? '\0' : 'Z', dst[i]) << i;
+            }
+        } else if (f[0] == "amp") {
+            EXPECT_EQ(0, unescape_amp(&f[1][0]));
+            EXPECT_EQ(f[2], f[1].c_str());
+        } else {
+            EXPECT_EQ(std::stoul(f[2]), string2time(f[1].c_str(), int(f[1].size()) + 1));
         }
     }
+    EXPECT_GT(cases, 40);
 }
 
-TEST(UnescapeAmp, DecodesEachOccurrenceOnce) {
-    const std::pair<const char*, const char*> cases[] = {
-        // clang-format off
-        {"&amp;", "&"}, {"&amp;amp;", "&amp;"}, {"&amp;amp;amp;", "&amp;amp;"}, {"a&amp", "a&amp"},
-        {"", ""}, {"a?x=1&amp;y=2", "a?x=1&y=2"}, {"&amp;&amp;&amp;", "&&&"},
-        {"a&amp;amp;b&amp;", "a&amp;b&"}, {"&&amp;", "&&"}, {"&amp;&", "&&"},
-        {"&lt;&amp;gt;&#38;", "&lt;&gt;&#38;"}, {"&AMP;", "&AMP;"}, {"&amp ;", "&amp ;"},
-        // clang-format on
-    };
-    for (const auto& [input, expected] : cases) {
-        std::string text = input;
-        EXPECT_EQ(unescape_amp(text.data()), 0);
-        EXPECT_STREQ(text.c_str(), expected) << input;
+TEST(TextHelpers, NullAndEdgeArguments) {
+    char dst[8];
+    memset(dst, 'Z', sizeof(dst));
+    for (const auto& [source, size] :
+         {std::pair<const char*, int>{nullptr, 8}, {"![CDATA[a]]", 0}, {"![CDATA[a]]", -3}}) {
+        EXPECT_EQ(KA_ERR_LOAD_FAILED, parse_cdata(dst, source, size));
     }
-    EXPECT_EQ(unescape_amp(nullptr), 0);
-    // A decoding that moved the whole tail at every occurrence would not finish here.
+    EXPECT_EQ(std::string(8, 'Z'), std::string(dst, 8));
+    EXPECT_EQ(0, unescape_amp(nullptr));
+    // The length only guards against nothing.
+    EXPECT_EQ(0u,
+              string2time(nullptr, 8) + string2time("00:00:30", 0) + string2time("00:00:30", -1));
+    EXPECT_EQ(30000u, string2time("00:00:30", 1));
+    // Decoding that moved the whole tail at every occurrence would not finish here.
     std::string many;
     for (int i = 0; i < 200000; ++i) many += "&amp;";
     unescape_amp(many.data());
-    EXPECT_EQ(std::string(many.c_str()), std::string(200000, '&'));
-}
-
-TEST(String2Time, Milliseconds) {
-    const std::pair<const char*, unsigned int> cases[] = {
-        // clang-format off
-        {"00:00:30", 30000u}, {"01:02:03.004", 3723004u}, {"00:00:01.5", 1005u},
-        {"00:00:01.5000", 1500u}, {"12:34", 45240000u}, {"1:2:3.4", 3723004u},
-        {"99:99:99.999", 362439999u}, {"+1:00:00", 3600000u}, {"-1:00:00", 0u - 3600000u},
-        // The sign takes one of the two places: "+0" is read, then ':' does not match '1'.
-        {"+01:00:00", 0u}, {" 00:00:05", 5000u}, {"123:00:00", 43200000u}, {"01", 3600000u},
-        {"00:01:00,500", 60000u}, {"abc", 0u}, {"", 0u},
-        // clang-format on
-    };
-    for (const auto& [text, expected] : cases) {
-        EXPECT_EQ(string2time(text, static_cast<int>(strlen(text)) + 1), expected) << text;
-    }
-    // The length only guards against nothing.
-    EXPECT_EQ(string2time(nullptr, 8), 0u);
-    EXPECT_EQ(string2time("00:00:30", 0), 0u);
-    EXPECT_EQ(string2time("00:00:30", -1), 0u);
-    EXPECT_EQ(string2time("00:00:30", 1), 30000u);
+    EXPECT_EQ(std::string(200000, '&'), many.c_str());
 }
 
 }  // namespace
