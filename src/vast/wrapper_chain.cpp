@@ -9,16 +9,9 @@
 #include "ka/result_codes.h"
 #include "net/download.h"
 #include "vast/vast_parser.h"
+#include "xml/text.h"
 
 namespace {
-
-char* CopyString(const char* text) {
-    if (text == nullptr) return nullptr;
-    const size_t length = strlen(text);
-    char* copy = new char[length + 1];
-    memcpy(copy, text, length + 1);
-    return copy;
-}
 
 // The end of a list being appended to: the link that receives the next node, and the number
 // of nodes before it. Found with one walk, then moved along each appended copy, so appending
@@ -226,7 +219,7 @@ AdImpression* CVASTParser::CopyImpressionList(AdImpression* list) {
     AdImpression** link = &head;
     for (; list != nullptr; list = list->next) {
         AdImpression* copy = new AdImpression();
-        copy->url = CopyString(list->url);
+        copy->url = ka::CopyString(list->url);
         *link = copy;
         link = &copy->next;
     }
@@ -238,8 +231,8 @@ AdClick* CVASTParser::CopyClickList(AdClick* list) {
     AdClick** link = &head;
     for (; list != nullptr; list = list->next) {
         AdClick* copy = new AdClick();
-        copy->id = CopyString(list->id);
-        copy->url = CopyString(list->url);
+        copy->id = ka::CopyString(list->id);
+        copy->url = ka::CopyString(list->url);
         *link = copy;
         link = &copy->next;
     }
@@ -251,10 +244,10 @@ AdTracking* CVASTParser::CopyTrackingList(AdTracking* list) {
     AdTracking** link = &head;
     for (; list != nullptr; list = list->next) {
         AdTracking* copy = new AdTracking();
-        copy->event = CopyString(list->event);
+        copy->event = ka::CopyString(list->event);
         copy->offsetKind = list->offsetKind;
         copy->offset = list->offset;
-        copy->url = CopyString(list->url);
+        copy->url = ka::CopyString(list->url);
         *link = copy;
         link = &copy->next;
     }

@@ -8,8 +8,7 @@
 #include "platform/limits.h"
 #include "vast/vast_parser.h"
 #include "vmap/vmap_values.h"
-#include "xml/element_values.h"
-#include "xml/text_helpers.h"
+#include "xml/text.h"
 
 namespace {
 
@@ -260,21 +259,21 @@ void CVMAPParser::ReadContentUri(void* extensions) {
     void* extension = nullptr;
     GetChildByName(extensions, Name("uo:unicornOnce"), &extension);
     if (extension == nullptr) return;
-    if (ka::CopyAttribute(*this, extension, "contenturi", mContentUri)) unescape_amp(mContentUri);
+    if (CopyAttribute(extension, "contenturi", mContentUri)) unescape_amp(mContentUri);
 }
 
 unsigned int CVMAPParser::ParseAdBreakAttributes(void* node, AdBreak* adBreak) {
     if (node == nullptr || adBreak == nullptr) return KA_OK;
     char* value = nullptr;
     int length = 0;
-    if (ka::ReadAttribute(*this, node, "breakType", &value, length)) {
+    if (ReadAttribute(node, "breakType", &value, length)) {
         adBreak->breakType |= ka::ParseBreakType(value, length);
     }
-    ka::CopyAttribute(*this, node, "breakId", adBreak->breakId);
-    if (ka::ReadAttribute(*this, node, "timeOffset", &value, length)) {
+    CopyAttribute(node, "breakId", adBreak->breakId);
+    if (ReadAttribute(node, "timeOffset", &value, length)) {
         ka::ParseTimeOffset(value, length, &adBreak->timeOffsetType, &adBreak->timeOffset);
     }
-    if (ka::ReadAttribute(*this, node, "repeatAfter", &value, length)) {
+    if (ReadAttribute(node, "repeatAfter", &value, length)) {
         adBreak->repeatAfter = ka::ParseRepeatAfter(value, length);
     }
     return KA_OK;
@@ -301,11 +300,11 @@ unsigned int CVMAPParser::ParseAdSourceAttributes(void* node, AdSource* source) 
     if (node == nullptr || source == nullptr) return KA_OK;
     char* value = nullptr;
     int length = 0;
-    if (ka::ReadAttribute(*this, node, "id", &value, length)) source->id = ka::ParseDecimal(value);
-    if (ka::ReadAttribute(*this, node, "allowMultipleAds", &value, length)) {
+    if (ReadAttribute(node, "id", &value, length)) source->id = ka::ParseDecimal(value);
+    if (ReadAttribute(node, "allowMultipleAds", &value, length)) {
         source->allowMultipleAds = strcmp(value, "true") == 0;
     }
-    if (ka::ReadAttribute(*this, node, "followRedirects", &value, length)) {
+    if (ReadAttribute(node, "followRedirects", &value, length)) {
         source->followRedirects = strcmp(value, "true") == 0;
     }
     return KA_OK;
@@ -341,6 +340,6 @@ unsigned int CVMAPParser::LoadTrackingTag(void* node, void* target, char* name,
 
 unsigned int CVMAPParser::ParseTrackingEvent(void* node, AdBreakTracking* tracking) {
     if (node == nullptr || tracking == nullptr) return KA_OK;
-    ka::CopyAttribute(*this, node, "event", tracking->event);
+    CopyAttribute(node, "event", tracking->event);
     return KA_OK;
 }

@@ -1,4 +1,4 @@
-#include "xml/text_helpers.h"
+#include "xml/text.h"
 
 #include <gtest/gtest.h>
 

@@ -8,6 +8,7 @@
 #include <cstring>
 
 #include "ka/vmap_records.h"
+#include "xml/text.h"
 
 namespace {
 
