@@ -4,9 +4,11 @@
 // element, and the handlers fill the records.
 #pragma once
 
+#include <cstddef>
+
 #include "ka/types.h"
 #include "ka/vast_records.h"
-#include "xml/list_tail.h"
+#include "xml/record_lists.h"
 #include "xml/xml_document.h"
 
 class CExtensionParser;
@@ -78,8 +80,9 @@ public:
     // Copies the tracking of the wrapper's Linear creatives into every Linear creative of
     // inlineCreatives.
     unsigned int MergeCreatives(AdWrapper* wrapper, AdCreative* inlineCreatives);
-    // Appends copies of wrapperCreative's click tracking, custom clicks and tracking events to
-    // those of inlineCreative (both Linear) and sets their counts to the list lengths.
+    // MergeCreatives for one pair: appends copies of wrapperCreative's click tracking, custom
+    // clicks and tracking events to those of inlineCreative (both Linear) and sets their counts
+    // to the list lengths.
     unsigned int MergeLinear(AdCreative* wrapperCreative, AdCreative* inlineCreative);
     // Deep copies in list order, each node and string newly allocated; null for a null list.
     AdImpression* CopyImpressionList(AdImpression* list);
@@ -107,10 +110,14 @@ private:
     unsigned int LoadExtensions(void* node, CAdExtensions*& extensions);
     // Wrapper ads of mVastAdData, in list order, while this document is above the depth limit.
     void WalkWrappers(bool mergeWrappers);
+    // The one merge primitive of MergeCreatives and MergeLinear: appends copies of the click
+    // tracking, custom clicks (of each source's first VideoClicks) and tracking events of count
+    // Linear sources, in their order, to target, walking each list of target to its end once.
+    void AppendLinearTracking(AdLinear* target, AdLinear* const* sources, size_t count);
     // Forgets the remembered list ends; called around every walk and by every release.
     void ResetTails();
 
-    // Last nodes appended, one per kind of list being filled (list_tail.h).
+    // Last nodes appended, one per kind of list being filled (record_lists.h).
     ka::ListTail<AdData> mAdTail;
     ka::ListTail<AdImpression> mImpressionTail;
     ka::ListTail<AdCreative> mCreativeTail;

@@ -9,37 +9,10 @@
 #include "ka/result_codes.h"
 #include "net/download.h"
 #include "vast/vast_parser.h"
+#include "xml/record_lists.h"
 #include "xml/text.h"
 
 namespace {
-
-// The end of a list being appended to: the link that receives the next node, and the number
-// of nodes before it. Found with one walk, then moved along each appended copy, so appending
-// many copies to a long list stays linear.
-template <typename T>
-struct ListEnd {
-    T** link;
-    uint32_t count;
-};
-
-template <typename T>
-ListEnd<T> FindEnd(T** head) {
-    ListEnd<T> end = {head, 0};
-    while (*end.link != nullptr) {
-        end.link = &(*end.link)->next;
-        ++end.count;
-    }
-    return end;
-}
-
-template <typename T>
-void Attach(ListEnd<T>& end, T* list) {
-    *end.link = list;
-    while (*end.link != nullptr) {
-        end.link = &(*end.link)->next;
-        ++end.count;
-    }
-}
 
 AdLinear* LinearOf(AdCreative* creative) {
     return creative != nullptr && creative->kind == AD_CREATIVE_LINEAR ? &creative->content
@@ -105,8 +78,8 @@ unsigned int CVASTParser::MergeWrapper(AdData* ad) {
             }
         } else if (inner->type == AD_TYPE_INLINE && inner->body != nullptr) {
             AdInLine* inLine = static_cast<AdInLine*>(inner->body);
-            ListEnd<AdImpression> end = FindEnd(&inLine->impressions);
-            Attach(end, CopyImpressionList(wrapper->impressions));
+            ka::ListEnd<AdImpression> end = ka::FindEnd(&inLine->impressions);
+            ka::Attach(end, CopyImpressionList(wrapper->impressions));
             inLine->impressionCount = end.count;
             MergeCreatives(wrapper, inLine->creatives);
         }
@@ -161,31 +134,7 @@ unsigned int CVASTParser::MergeCreatives(AdWrapper* wrapper, AdCreative* inlineC
 
     for (AdCreative* d = inlineCreatives; d != nullptr; d = d->next) {
         AdLinear* target = LinearOf(d);
-        if (target == nullptr) continue;
-        for (AdVideoClicks* v = target->videoClicks; v != nullptr; v = v->next) {
-            ListEnd<AdClick> trackings = FindEnd(&v->clickTrackings);
-            ListEnd<AdClick> customs = FindEnd(&v->customClicks);
-            bool trackingsCopied = false;
-            bool customsCopied = false;
-            for (AdLinear* source : sources) {
-                // Only the first VideoClicks of the wrapper creative is read.
-                const AdVideoClicks* u = source->videoClicks;
-                if (u == nullptr) continue;
-                if (u->clickTrackings != nullptr) {
-                    Attach(trackings, CopyClickList(u->clickTrackings));
-                    trackingsCopied = true;
-                }
-                if (u->customClicks != nullptr) {
-                    Attach(customs, CopyClickList(u->customClicks));
-                    customsCopied = true;
-                }
-            }
-            if (trackingsCopied) v->clickTrackingCount = trackings.count;
-            if (customsCopied) v->customClickCount = customs.count;
-        }
-        ListEnd<AdTracking> events = FindEnd(&target->trackingEvents);
-        for (AdLinear* source : sources) Attach(events, CopyTrackingList(source->trackingEvents));
-        target->trackingCount = events.count;
+        if (target != nullptr) AppendLinearTracking(target, sources.data(), sources.size());
     }
     return KA_OK;
 }
@@ -193,25 +142,39 @@ unsigned int CVASTParser::MergeCreatives(AdWrapper* wrapper, AdCreative* inlineC
 unsigned int CVASTParser::MergeLinear(AdCreative* wrapperCreative, AdCreative* inlineCreative) {
     AdLinear* source = LinearOf(wrapperCreative);
     AdLinear* target = LinearOf(inlineCreative);
-    if (source == nullptr || target == nullptr) return KA_OK;
-    const AdVideoClicks* u = source->videoClicks;
-    for (AdVideoClicks* v = target->videoClicks; v != nullptr && u != nullptr; v = v->next) {
-        if (u->clickTrackings != nullptr) {
-            ListEnd<AdClick> end = FindEnd(&v->clickTrackings);
-            Attach(end, CopyClickList(u->clickTrackings));
-            v->clickTrackingCount = end.count;
-        }
-        if (u->customClicks != nullptr) {
-            ListEnd<AdClick> end = FindEnd(&v->customClicks);
-            Attach(end, CopyClickList(u->customClicks));
-            v->customClickCount = end.count;
-        }
-    }
-    // The wrapper's click-through is not copied: the InLine's own destination stands.
-    ListEnd<AdTracking> events = FindEnd(&target->trackingEvents);
-    Attach(events, CopyTrackingList(source->trackingEvents));
-    target->trackingCount = events.count;
+    if (source != nullptr && target != nullptr) AppendLinearTracking(target, &source, 1);
     return KA_OK;
+}
+
+void CVASTParser::AppendLinearTracking(AdLinear* target, AdLinear* const* sources, size_t count) {
+    for (AdVideoClicks* v = target->videoClicks; v != nullptr; v = v->next) {
+        ka::ListEnd<AdClick> trackings = ka::FindEnd(&v->clickTrackings);
+        ka::ListEnd<AdClick> customs = ka::FindEnd(&v->customClicks);
+        bool trackingsCopied = false;
+        bool customsCopied = false;
+        for (size_t i = 0; i < count; ++i) {
+            // Only the first VideoClicks of the wrapper creative is read.
+            const AdVideoClicks* u = sources[i]->videoClicks;
+            if (u == nullptr) continue;
+            if (u->clickTrackings != nullptr) {
+                ka::Attach(trackings, CopyClickList(u->clickTrackings));
+                trackingsCopied = true;
+            }
+            if (u->customClicks != nullptr) {
+                ka::Attach(customs, CopyClickList(u->customClicks));
+                customsCopied = true;
+            }
+        }
+        // A count is rewritten only with its list; the click-through is never copied: the
+        // InLine's own destination stands.
+        if (trackingsCopied) v->clickTrackingCount = trackings.count;
+        if (customsCopied) v->customClickCount = customs.count;
+    }
+    ka::ListEnd<AdTracking> events = ka::FindEnd(&target->trackingEvents);
+    for (size_t i = 0; i < count; ++i) {
+        ka::Attach(events, CopyTrackingList(sources[i]->trackingEvents));
+    }
+    target->trackingCount = events.count;
 }
 
 AdImpression* CVASTParser::CopyImpressionList(AdImpression* list) {

@@ -8,7 +8,7 @@
 #include "ka/types.h"
 #include "ka/vast_records.h"
 #include "ka/vmap_records.h"
-#include "xml/list_tail.h"
+#include "xml/record_lists.h"
 #include "xml/xml_document.h"
 
 class CVASTParser;
