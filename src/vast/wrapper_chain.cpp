@@ -9,6 +9,7 @@
 #include "ka/result_codes.h"
 #include "net/download.h"
 #include "vast/vast_parser.h"
+#include "vast/vast_release.h"
 #include "xml/record_lists.h"
 #include "xml/text.h"
 
@@ -26,20 +27,19 @@ bool HasClicks(const AdVideoClicks* clicks) {
 
 }  // namespace
 
-unsigned int CVASTParser::FetchWrapper(AdData* ad) {
+unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     if (ad == nullptr || ad->body == nullptr || ad->type != AD_TYPE_WRAPPER) return KA_OK;
     AdWrapper* wrapper = static_cast<AdWrapper*>(ad->body);
 
     // Without a caller's flag (a VAST element of a VMAP document) downloads get one that stays
     // false: the download needs a flag to read.
     KA_BOOL neverStop = 0;
-    KA_BOOL* stopFlag = mStopFlag != nullptr ? mStopFlag : &neverStop;
-    if (mFetchBudget == nullptr || *mFetchBudget == 0) return KA_ERR_LOAD_FAILED;
-    --*mFetchBudget;
+    KA_BOOL* stopFlag = chain.stopFlag != nullptr ? chain.stopFlag : &neverStop;
+    if (!chain.TakeFetch()) return KA_ERR_LOAD_FAILED;
     unsigned char* buffer = nullptr;
     uint32_t size = 0;
     const uint32_t downloaded =
-        ka_download_by_url(wrapper->vastAdTagUri, &buffer, &size, mWorkPath, stopFlag);
+        ka_download_by_url(wrapper->vastAdTagUri, &buffer, &size, chain.workPath, stopFlag);
     if (downloaded != 0 || size == 0 || buffer == nullptr) {
         delete[] buffer;
         return KA_ERR_LOAD_FAILED;
@@ -47,14 +47,12 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad) {
 
     CVASTParser* nested = new CVASTParser();
     wrapper->nestedParser = nested;
-    nested->SetWorkPath(mWorkPath);
+    nested->SetWorkPath(chain.workPath);
     // A failed load shows up as a failed Process below.
     nested->InitXMLParser();
     nested->mVastAdData.depth = mVastAdData.depth + 1;
-    nested->mFetchBudget = mFetchBudget;
     // The nested parser reads the document and runs its own wrappers before this returns.
-    const unsigned int result = nested->Process(buffer, size, mMergeWrappers, mStopFlag);
-    nested->mFetchBudget = &nested->mFetchesLeft;
+    const unsigned int result = nested->ProcessInChain(buffer, size, chain);
     delete[] buffer;
     nested->Close();
     return result;
@@ -72,7 +70,7 @@ unsigned int CVASTParser::MergeWrapper(AdData* ad) {
             AdWrapper* innerWrapper = static_cast<AdWrapper*>(inner->body);
             if (innerWrapper->nestedParser != nullptr) {
                 CVASTParser* deeper = innerWrapper->nestedParser;
-                deeper->ReleaseVastAdData(&deeper->mVastAdData);
+                ka::ReleaseVastAdData(&deeper->mVastAdData);
                 delete deeper;
                 innerWrapper->nestedParser = nullptr;
             }
@@ -109,7 +107,7 @@ unsigned int CVASTParser::MergeWrapper(AdData* ad) {
     ad->sequence = sequence;
 
     // Only the wrapped document's first ad survives.
-    nested->ReleaseVastAdData(&wrapped);
+    ka::ReleaseVastAdData(&wrapped);
     delete nested;
     return KA_OK;
 }
