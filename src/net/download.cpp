@@ -9,9 +9,9 @@
 #include "ka/os_utils.h"
 #include "ka/result_codes.h"
 #include "ka/uri.h"
-#include "net/source_io_api.h"
 #include "platform/lib_loader.h"
 #include "platform/limits.h"
+#include "source_io_api.h"
 
 namespace {
 

@@ -9,9 +9,6 @@
 
 namespace {
 
-// The service loads every module with the dynamic loader's RTLD_NOW.
-constexpr int kLoadNow = 2;
-
 // Codec modules that come in a CPU variant ("_v7.so") on processors that can use it.
 const char* const kVariantModules[] = {
     "kaVidDec",   "kaH264Dec",  "kaH265Dec", "kaMPEG4Dec", "kaVP9Dec", "kaAACDec",
@@ -96,7 +93,7 @@ int CLibLoader::LoadLib(void* /*unused*/) {
         ka::AppendBounded(mLibName, sizeof(mLibName), requested);
         if (strstr(requested, ".so") == nullptr) ka::AppendBounded(mLibName, sizeof(mLibName), ".so");
         mLibHandle = LoadVariantLib(mLibName);
-        if (mLibHandle == nullptr) mLibHandle = mLoadLibrary(mLibName, kLoadNow);
+        if (mLibHandle == nullptr) mLibHandle = mLoadLibrary(mLibName, ka::kModuleLoadNow);
         if (mLibHandle == nullptr) return 0;
     } else {
         // A name with a directory in it is a path: nothing else is tried.
@@ -105,7 +102,7 @@ int CLibLoader::LoadLib(void* /*unused*/) {
         for (const char* prefix : prefixes) {
             ka::CopyBounded(mLibName, sizeof(mLibName), prefix);
             ka::AppendBounded(mLibName, sizeof(mLibName), requested);
-            mLibHandle = mLoadLibrary(mLibName, kLoadNow);
+            mLibHandle = mLoadLibrary(mLibName, ka::kModuleLoadNow);
             if (mLibHandle != nullptr || isPath) break;
         }
         if (mLibHandle == nullptr) return 0;
@@ -137,7 +134,7 @@ void* CLibLoader::LoadVariantLib(char* path) {
 
     LoadModuleService();
     if (mLoadLibrary == nullptr) return nullptr;
-    void* handle = mLoadLibrary(variant, kLoadNow);
+    void* handle = mLoadLibrary(variant, ka::kModuleLoadNow);
     if (handle != nullptr) ka::CopyBounded(mLibName, sizeof(mLibName), variant);
     return handle;
 }

@@ -3,6 +3,7 @@
 // resolves the module's single entry function.
 #pragma once
 
+#include "module_service_api.h"
 #include "platform/limits.h"
 #include "platform/sdk_object.h"
 
@@ -10,10 +11,6 @@ struct ModuleContext;  // supplied by the host, never dereferenced here
 
 // A module's entry function fills the module's table of operations; its result is not used.
 typedef int (*KaModuleEntry)(void* api);
-// The three functions of the module-loading service.
-typedef void* (*KaLoadLibraryFn)(const char* name, int flags);
-typedef void* (*KaGetAddressSymbolFn)(void* handle, const char* symbol);
-typedef int (*KaFreeLibraryFn)(void* handle);
 
 class CLibLoader : public CSDKObject {
 public:

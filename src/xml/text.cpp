@@ -4,13 +4,9 @@
 #include <cstring>
 
 #include "ka/result_codes.h"
+#include "xml_parser_api.h"
 
 namespace {
-
-constexpr char kCDataOpen[] = "![CDATA[";
-constexpr size_t kCDataOpenLength = sizeof(kCDataOpen) - 1;
-constexpr char kCDataClose[] = "]]";
-constexpr size_t kCDataCloseLength = sizeof(kCDataClose) - 1;
 
 constexpr char kAmpEntity[] = "&amp;";
 constexpr size_t kAmpEntityLength = sizeof(kAmpEntity) - 1;
@@ -23,18 +19,18 @@ constexpr long long kDecimalCeiling = static_cast<long long>(INT_MAX) + 1;
 namespace ka {
 
 bool IsCDataSection(const char* text) {
-    return text[0] == kCDataOpen[0] && strncmp(text, kCDataOpen, kCDataOpenLength) == 0;
+    return text[0] == kXmlCDataOpen[0] && strncmp(text, kXmlCDataOpen, kXmlCDataOpenLength) == 0;
 }
 
 bool CDataContent(const char* text, size_t length, size_t* begin, size_t* count) {
     // The opening ends in '[' and the closing holds none, so the two never overlap.
-    if (length < kCDataOpenLength + kCDataCloseLength ||
-        memcmp(text, kCDataOpen, kCDataOpenLength) != 0 ||
-        memcmp(text + length - kCDataCloseLength, kCDataClose, kCDataCloseLength) != 0) {
+    if (length < kXmlCDataOpenLength + kXmlCDataCloseLength ||
+        memcmp(text, kXmlCDataOpen, kXmlCDataOpenLength) != 0 ||
+        memcmp(text + length - kXmlCDataCloseLength, kXmlCDataClose, kXmlCDataCloseLength) != 0) {
         return false;
     }
-    size_t first = kCDataOpenLength;
-    size_t end = length - kCDataCloseLength;
+    size_t first = kXmlCDataOpenLength;
+    size_t end = length - kXmlCDataCloseLength;
     while (first < end && IsSpace(text[first])) ++first;
     while (end > first && IsSpace(text[end - 1])) --end;
     *begin = first;

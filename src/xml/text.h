@@ -7,6 +7,8 @@
 #include <cstring>
 #include <string>
 
+#include "xml_parser_api.h"
+
 // Copies the trimmed content of a raw "![CDATA[...]]" section into dst (size bytes, always
 // terminated); 0 when the whole content fit, 0x91001000 otherwise or for a null source.
 unsigned int parse_cdata(char* dst, const char* src, int size);
@@ -17,11 +19,9 @@ unsigned int string2time(const char* text, int length);
 
 namespace ka {
 
-// The six white-space characters of C's "C" locale; bytes at or above 0x80 are never white
-// space, whatever the locale says.
-inline bool IsSpace(char c) {
-    return c == ' ' || c == '\t' || c == '\n' || c == '\v' || c == '\f' || c == '\r';
-}
+// The six white-space characters of C's "C" locale, the same the XML module trims; bytes at or
+// above 0x80 are never white space, whatever the locale says.
+inline bool IsSpace(char c) { return IsXmlSpace(c); }
 
 // Exact, case-sensitive comparison of a tag name of the given length with a literal. Inline, so
 // that the literal's length is known where it is called: every handler tries several names.

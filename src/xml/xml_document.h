@@ -4,7 +4,7 @@
 #pragma once
 
 #include "platform/lib_loader.h"
-#include "xml/xml_parser_api.h"
+#include "xml_parser_api.h"
 
 class CXMLDocument : public CLibLoader {
 public:

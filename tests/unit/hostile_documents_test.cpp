@@ -12,7 +12,7 @@
 
 #include "ka/result_codes.h"
 #include "ka/vmap_parser_api.h"
-#include "net/source_io_api.h"
+#include "source_io_api.h"
 #include "vmap/vmap_parser.h"
 
 namespace {
