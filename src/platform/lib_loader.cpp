@@ -5,7 +5,6 @@
 #include <cstring>
 
 #include "platform/bounded_string.h"
-#include "platform/cpu_info.h"
 
 namespace {
 
@@ -23,6 +22,25 @@ bool IsVariantModule(const char* path) {
 }
 
 }  // namespace
+
+namespace ka {
+
+void ApplyCpuRecord(CLibLoader& loader, const CpuInfoRecord& info) {
+    if (info.type == KA_CPU_TYPE_ARM && (info.features & KA_CPU_FEATURE_NEON) != 0) {
+        CopyBounded(loader.mLibSuffix, sizeof(loader.mLibSuffix), "_v7.so");
+    }
+    loader.mCpuCount = info.count;
+}
+
+void ApplyCpuDefaults(CLibLoader& loader, const char* name) {
+    // Loaders of video decoders keep the plain defaults: one core, no variant suffix.
+    if (name != nullptr && strstr(name, "VidDec") != nullptr) return;
+    CpuInfoRecord info = {};
+    if (get_cpu_info(&info) != 0) return;
+    ApplyCpuRecord(loader, info);
+}
+
+}  // namespace ka
 
 CLibLoader::CLibLoader() {
     Init();
