@@ -1,6 +1,6 @@
 #include "bench_support.h"
 
-#include "net/source_io_api.h"
+#include "source_io_api.h"
 
 #include <dlfcn.h>
 

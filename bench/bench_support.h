@@ -11,7 +11,7 @@
 #include <benchmark/benchmark.h>
 
 #include "ka/vmap_parser_api.h"
-#include "xml/xml_parser_api.h"
+#include "xml_parser_api.h"
 
 namespace bench {
 

@@ -25,8 +25,8 @@
 #include "bench_support.h"
 #include "hostile_documents.h"
 #include "ka/vmap_parser_api.h"
-#include "net/source_io_api.h"
-#include "xml/xml_parser_api.h"
+#include "source_io_api.h"
+#include "xml_parser_api.h"
 
 namespace {
 

@@ -26,7 +26,7 @@
 #include "bench_support.h"
 #include "ka/download.h"
 #include "ka/vmap_parser_api.h"
-#include "net/source_io_api.h"
+#include "source_io_api.h"
 
 namespace {
 

@@ -18,8 +18,7 @@
 #include <string>
 
 #include "ka/download.h"
-// Relative, so that tests without src/ on their include path can use this header too.
-#include "../src/net/source_io_api.h"
+#include "source_io_api.h"
 
 namespace kanonet {
 

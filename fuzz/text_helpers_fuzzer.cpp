@@ -8,7 +8,7 @@
 #include <cstring>
 #include <string>
 
-#include "xml/text_helpers.h"
+#include "xml/text.h"
 
 namespace {
 

@@ -2,6 +2,10 @@
 // with the dynamic loader.
 #include <dlfcn.h>
 
+#include <type_traits>
+
+#include "module_service_api.h"
+
 #define KADL_API extern "C" __attribute__((visibility("default")))
 
 KADL_API void* kaLoadLibrary(const char* name, int flags) {
@@ -18,3 +22,9 @@ KADL_API int kaFreeLibrary(void* handle) {
     if (handle == nullptr) return -1;
     return dlclose(handle);
 }
+
+// The entries have the types the library resolves them as.
+static_assert(std::is_same<decltype(&kaLoadLibrary), KaLoadLibraryFn>::value, "kaLoadLibrary");
+static_assert(std::is_same<decltype(&kaGetAddressSymbol), KaGetAddressSymbolFn>::value,
+              "kaGetAddressSymbol");
+static_assert(std::is_same<decltype(&kaFreeLibrary), KaFreeLibraryFn>::value, "kaFreeLibrary");

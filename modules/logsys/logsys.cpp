@@ -3,8 +3,10 @@
 #include <cstdint>
 #include <cstdio>
 #include <cstring>
+#include <type_traits>
 
 #include "ka/result_codes.h"
+#include "log_library_api.h"
 
 #if defined(__ANDROID__)
 #include <android/log.h>
@@ -16,8 +18,6 @@ namespace {
 
 // The library's maximum level: the facade passes what it lets through, all of it is written.
 constexpr int kMaxLevel = 0;
-// The facade hands kaLogDllLogGetErrMsg a buffer of this size.
-constexpr size_t kErrorTextSize = 2048;
 
 int WriteLine(const char* channel, int level, const char* text) {
     if (text == nullptr) return -1;
@@ -75,7 +75,7 @@ KA_LOGSYS_API int kaLogDllUninit() { return 0; }
 
 KA_LOGSYS_API int kaLogDllLogGetErrMsg(uint32_t code, char* buffer) {
     if (buffer == nullptr) return -1;
-    snprintf(buffer, kErrorTextSize, "0x%08x: %s", code, DescribeCode(code));
+    snprintf(buffer, ka::kLogErrorTextSize, "0x%08x: %s", code, DescribeCode(code));
     return 0;
 }
 
@@ -86,3 +86,18 @@ KA_LOGSYS_API int kaLogDllLogPrint_rpc(int level, const char* text) {
 
 // No parameters are known to the stand-in.
 KA_LOGSYS_API int kaLogDllSetParam(int /*id*/, void* /*value*/) { return -1; }
+
+// The entries have the types the library resolves them as.
+static_assert(std::is_same<decltype(&kaLogDllInit), ka::LogDllInitFn>::value, "kaLogDllInit");
+static_assert(std::is_same<decltype(&kaLogDllGetMaxLevel), ka::LogDllGetMaxLevelFn>::value,
+              "kaLogDllGetMaxLevel");
+static_assert(std::is_same<decltype(&kaLogDllLogPrint), ka::LogDllPrintFn>::value &&
+                  std::is_same<decltype(&kaLogDllLogPrintEx), ka::LogDllPrintFn>::value &&
+                  std::is_same<decltype(&kaLogDllLogPrintL0), ka::LogDllPrintFn>::value &&
+                  std::is_same<decltype(&kaLogDllLogPrint_rpc), ka::LogDllPrintFn>::value,
+              "the print entries");
+static_assert(std::is_same<decltype(&kaLogDllUninit), ka::LogDllUninitFn>::value, "kaLogDllUninit");
+static_assert(std::is_same<decltype(&kaLogDllLogGetErrMsg), ka::LogDllGetErrMsgFn>::value,
+              "kaLogDllLogGetErrMsg");
+static_assert(std::is_same<decltype(&kaLogDllSetParam), ka::LogDllSetParamFn>::value,
+              "kaLogDllSetParam");

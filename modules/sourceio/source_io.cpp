@@ -11,14 +11,13 @@
 
 #include <cerrno>
 #include <climits>
+#include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <mutex>
 #include <new>
 
-#include "net/source_io_api.h"
-#include "platform/bounded_string.h"
-#include "platform/limits.h"
+#include "source_io_api.h"
 
 #define KA_SOURCEIO_API extern "C" __attribute__((visibility("default")))
 
@@ -48,8 +47,8 @@ bool gCurlReady = false;
 enum class State { kCreated, kRunning, kDone, kFailed };
 
 struct Source {
-    char url[ka::kUrlSize] = {};
-    char finalUrl[ka::kUrlSize] = {};
+    char url[KA_DOWNLOAD_URL_SIZE] = {};
+    char finalUrl[KA_DOWNLOAD_URL_SIZE] = {};
     char userAgent[kUserAgentSize] = {};
     Settings settings;
     State state = State::kCreated;
@@ -119,6 +118,14 @@ bool ClimbsUp(const char* path) {
     }
 }
 
+// Copies src into dst (size bytes), cut to fit and always terminated; null copies as "".
+void CopyBounded(char* dst, size_t size, const char* src) {
+    if (size != 0) snprintf(dst, size, "%s", src != nullptr ? src : "");
+}
+
+// Whether snprintf's result says that the whole string went into size bytes.
+bool Fits(int written, size_t size) { return written >= 0 && static_cast<size_t>(written) < size; }
+
 // The local path a file reference names, or false when it names none that may be read.
 bool FilePath(const Source* source, char* path, size_t size) {
     const char* url = source->url;
@@ -126,23 +133,14 @@ bool FilePath(const Source* source, char* path, size_t size) {
         url += strlen("file://");
         if (StartsWithNoCase(url, "localhost/")) url += strlen("localhost");
         if (url[0] != '/') return false;
-        ka::CopyBounded(path, size, url);
-        return strlen(url) < size;
+        return Fits(snprintf(path, size, "%s", url), size);
     }
     if (HasScheme(url) || url[0] == '\0') return false;
-    if (url[0] == '/') {
-        ka::CopyBounded(path, size, url);
-        return strlen(url) < size;
-    }
+    if (url[0] == '/') return Fits(snprintf(path, size, "%s", url), size);
     if (ClimbsUp(url)) return false;
-    path[0] = '\0';
-    if (source->settings.baseDir[0] != '\0') {
-        ka::CopyBounded(path, size, source->settings.baseDir);
-        if (path[strlen(path) - 1] != '/') ka::AppendBounded(path, size, "/");
-    }
-    const size_t used = strlen(path);
-    ka::AppendBounded(path, size, url);
-    return used + strlen(url) < size;
+    const char* base = source->settings.baseDir;
+    const bool slash = base[0] != '\0' && base[strlen(base) - 1] != '/';
+    return Fits(snprintf(path, size, "%s%s%s", base, slash ? "/" : "", url), size);
 }
 
 // Reads a regular file whole; devices and pipes are refused so that nothing blocks.
@@ -212,8 +210,8 @@ void Finish(Source* source, CURLcode code) {
     curl_easy_getinfo(source->easy, CURLINFO_EFFECTIVE_URL, &effective);
     source->httpStatus = static_cast<uint32_t>(status);
     source->redirects = static_cast<uint32_t>(redirects);
-    ka::CopyBounded(source->finalUrl, sizeof(source->finalUrl),
-                    effective != nullptr ? effective : source->url);
+    CopyBounded(source->finalUrl, sizeof(source->finalUrl),
+                effective != nullptr ? effective : source->url);
     const bool ok = code == CURLE_OK && status >= 200 && status < 400;
     source->state = ok ? State::kDone : State::kFailed;
     StopTransfer(source);
@@ -246,8 +244,7 @@ uint32_t SetModuleParam(uint32_t id, void* value) {
     if (id == ka::kSioWorkPath) return 0;  // modules are found by the host; nothing to keep
     std::lock_guard<std::mutex> lock(gSettingsMutex);
     if (id == ka::kSioFileBaseDir) {
-        ka::CopyBounded(gSettings.baseDir, sizeof(gSettings.baseDir),
-                        static_cast<const char*>(value));
+        CopyBounded(gSettings.baseDir, sizeof(gSettings.baseDir), static_cast<const char*>(value));
         return 0;
     }
     if (value == nullptr) return kUnknownParam;
@@ -297,8 +294,8 @@ uint32_t SioInit(void** handle, char* url, uint32_t /*flags*/, void* /*init*/) {
     if (handle == nullptr || url == nullptr) return ka::kSioFailed;
     Source* source = new (std::nothrow) Source();
     if (source == nullptr) return ka::kSioFailed;
-    ka::CopyBounded(source->url, sizeof(source->url), url);
-    ka::CopyBounded(source->finalUrl, sizeof(source->finalUrl), url);
+    CopyBounded(source->url, sizeof(source->url), url);
+    CopyBounded(source->finalUrl, sizeof(source->finalUrl), url);
     {
         std::lock_guard<std::mutex> lock(gSettingsMutex);
         source->settings = gSettings;
@@ -386,7 +383,7 @@ uint32_t SioGetParam(void* handle, uint32_t id, void* value) {
             if (source->state != State::kDone || query->out == nullptr || query->outSize == 0) {
                 return kUnknownParam;
             }
-            ka::CopyBounded(query->out, query->outSize, source->finalUrl);
+            CopyBounded(query->out, query->outSize, source->finalUrl);
             return 0;
         }
         case ka::kSioRetryCount:
@@ -416,8 +413,8 @@ uint32_t SioSetParam(void* handle, uint32_t id, void* value) {
             return 0;  // the host's request records carry nothing this stand-in uses
         case ka::kSioHostText:
             if (source->state != State::kCreated) return kUnknownParam;
-            ka::CopyBounded(source->userAgent, sizeof(source->userAgent),
-                            static_cast<const char*>(value));
+            CopyBounded(source->userAgent, sizeof(source->userAgent),
+                        static_cast<const char*>(value));
             return 0;
         default:
             return kUnknownParam;

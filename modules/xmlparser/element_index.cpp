@@ -4,6 +4,8 @@
 #include <cstring>
 #include <new>
 
+#include "xml_parser_api.h"
+
 namespace xmlmodule {
 
 namespace {
@@ -16,21 +18,12 @@ constexpr size_t kMinBlockSize = 1024;
 // blocks each time.
 constexpr size_t kKeptLimit = 4 * 1024 * 1024;
 
-constexpr char kCDataOpen[] = "![CDATA[";
-constexpr size_t kCDataOpenLength = sizeof(kCDataOpen) - 1;
-constexpr char kCDataClose[] = "]]";
-constexpr size_t kCDataCloseLength = sizeof(kCDataClose) - 1;
-
 // The end of an attribute list, told without a call into pugixml: a handle is one pointer.
 bool IsEnd(const pugi::xml_attribute& attribute) {
     static_assert(sizeof(pugi::xml_attribute) == sizeof(void*), "a handle is one pointer");
     void* raw = nullptr;
     memcpy(&raw, &attribute, sizeof(raw));
     return raw == nullptr;
-}
-
-bool IsSpace(char c) {
-    return c == ' ' || c == '\t' || c == '\n' || c == '\v' || c == '\f' || c == '\r';
 }
 
 }  // namespace
@@ -172,9 +165,9 @@ bool ElementIndex::PrepareText(pugi::xml_node node, size_t* prepared) {
         // A text keeps its trimmed value. pugixml may write the new value over the old one,
         // so it goes through the scratch buffer rather than straight from the value itself.
         size_t begin = 0;
-        while (begin < length && IsSpace(value[begin])) ++begin;
+        while (begin < length && ka::IsXmlSpace(value[begin])) ++begin;
         size_t end = length;
-        while (end > begin && IsSpace(value[end - 1])) --end;
+        while (end > begin && ka::IsXmlSpace(value[end - 1])) --end;
         if (begin == 0 && end == length) return true;
         *prepared = end - begin;
         if (begin == end) return node.set_value("", 0);
@@ -183,9 +176,10 @@ bool ElementIndex::PrepareText(pugi::xml_node node, size_t* prepared) {
     }
     // A CDATA section reads as the library expects it: "![CDATA[" content "]]".
     mScratch.clear();
-    mScratch.insert(mScratch.end(), kCDataOpen, kCDataOpen + kCDataOpenLength);
+    mScratch.insert(mScratch.end(), ka::kXmlCDataOpen, ka::kXmlCDataOpen + ka::kXmlCDataOpenLength);
     mScratch.insert(mScratch.end(), value, value + length);
-    mScratch.insert(mScratch.end(), kCDataClose, kCDataClose + kCDataCloseLength);
+    mScratch.insert(mScratch.end(), ka::kXmlCDataClose,
+                    ka::kXmlCDataClose + ka::kXmlCDataCloseLength);
     *prepared = mScratch.size();
     return node.set_value(mScratch.data(), mScratch.size());
 }

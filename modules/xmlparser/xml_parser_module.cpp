@@ -1,5 +1,5 @@
 // Stand-in for the platform's XML parser module: the thirteen-slot table of
-// "xml/xml_parser_api.h" over pugixml.
+// "xml_parser_api.h" over pugixml.
 //
 // What the module promises, and how:
 // - A node is the module's record of an element (element_index.h), so a node from one handle's
@@ -32,7 +32,7 @@
 
 #include "element_index.h"
 #include "ka/result_codes.h"
-#include "xml/xml_parser_api.h"
+#include "xml_parser_api.h"
 
 namespace {
 

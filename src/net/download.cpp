@@ -9,9 +9,9 @@
 #include "ka/os_utils.h"
 #include "ka/result_codes.h"
 #include "ka/uri.h"
-#include "net/source_io_api.h"
 #include "platform/lib_loader.h"
 #include "platform/limits.h"
+#include "source_io_api.h"
 
 namespace {
 
@@ -53,17 +53,60 @@ uint32_t OpenSource(SourceIOApi* api, char* url, void** handle, void* const* req
     return api->Open(*handle, 1);
 }
 
-// The work shared by DownloadToBuffer and DownloadWithAllocator; exactly one of the two buffer
-// targets is used, chosen by record->allocator when toBuffer is false.
-uint32_t HostDownload(SourceIOApi* api, void* const* requests, DownloadRecord* record,
-                      uint8_t** buffer, uint32_t* capacity, uint32_t* bytesRead, KA_BOOL* stopFlag,
-                      KA_BOOL useBase, void* outRecord, char* text, bool toBuffer) {
-    if (record == nullptr) return KA_ERR_NULL_ARGUMENT;
-    if (toBuffer && (buffer == nullptr || capacity == nullptr || bytesRead == nullptr)) {
-        return KA_ERR_NULL_ARGUMENT;
-    }
+// When the size poll looks at the stop flag. The host operations ask at least once and look
+// after each answer; ka_download_by_url looks before asking and again after each pause.
+enum class StopCheck { kAfterEachAsk, kBeforeEachAsk };
 
-    char url[ka::kUrlSize] = {};
+// Asks the source for its size every kPollMs until it knows it. 0 once it does, and also when
+// the stop flag ends the wait (*size then holds whatever the source last wrote); the module's
+// failure code when the transfer failed.
+uint32_t PollSourceSize(SourceIOApi* api, void* handle, const KA_BOOL* stopFlag, uint64_t* size,
+                        StopCheck check) {
+    if (check == StopCheck::kBeforeEachAsk && IsStopped(stopFlag)) return 0;
+    for (;;) {
+        const uint32_t result = api->GetSourceSize(handle, size);
+        if (result == KA_ERR_DOWNLOAD_FAILED) return result;
+        if (result == 0) return 0;
+        if (check == StopCheck::kAfterEachAsk && IsStopped(stopFlag)) return 0;
+        SleepMs(kPollMs);
+        if (check == StopCheck::kBeforeEachAsk && IsStopped(stopFlag)) return 0;
+    }
+}
+
+// Reads *ioSize bytes into dst with neither a retry nor a time limit: the module bounds the
+// transfer itself.
+uint32_t ReadWhole(SourceIOApi* api, void* handle, uint8_t* dst, uint32_t* ioSize,
+                   KA_BOOL* stopFlag) {
+    return ReadSourceData(api, handle, dst, ioSize, stopFlag, kNoRetryLimit, kNoTimeLimit);
+}
+
+// What a host download hands the module besides the URL.
+struct HostRequest {
+    void* const* requests;  // the four request records, each may be null
+    char* text;             // the host's string, or null
+    void* outRecord;        // filled at the end of a successful download, or null
+    KA_BOOL* stopFlag;      // may be null
+    KA_BOOL useBase;        // join record->url to record->baseURL
+};
+
+// The caller's reusable buffer of DownloadToBuffer; DownloadWithAllocator has none and uses
+// record->allocator.
+struct HostBuffer {
+    uint8_t** buffer;
+    uint32_t* capacity;
+    uint32_t* bytesRead;
+};
+
+// The host's table: the operations the host download calls unchecked must be there.
+bool HasHostOperations(const SourceIOApi* api) {
+    return api != nullptr && api->GetSourceSize != nullptr && api->Read != nullptr &&
+           api->GetParam != nullptr && api->SetParam != nullptr &&
+           (api->Init == nullptr || api->Uninit != nullptr) &&
+           (api->Open == nullptr || api->Close != nullptr);
+}
+
+// The URL to fetch into url (kUrlSize bytes): record->url, joined to record->baseURL when asked.
+void ResolveUrl(const DownloadRecord* record, KA_BOOL useBase, char* url) {
     if (useBase != 0) {
         char ref[ka::kUrlSize];
         char base[ka::kUrlSize];
@@ -73,92 +116,94 @@ uint32_t HostDownload(SourceIOApi* api, void* const* requests, DownloadRecord* r
         base[sizeof(base) - 1] = '\0';
         CombineURL(url, ref, base);
     } else {
-        memcpy(url, record->url, sizeof(url));
+        memcpy(url, record->url, ka::kUrlSize);
     }
-    url[sizeof(url) - 1] = '\0';
+    url[ka::kUrlSize - 1] = '\0';
+}
 
-    // The host's table: the operations called unchecked below must be there.
-    if (api == nullptr || api->GetSourceSize == nullptr || api->Read == nullptr ||
-        api->GetParam == nullptr || api->SetParam == nullptr ||
-        (api->Init != nullptr && api->Uninit == nullptr) ||
-        (api->Open != nullptr && api->Close == nullptr)) {
-        return KA_ERR_DOWNLOAD_OPEN;
-    }
-    void* handle = nullptr;
-    uint32_t result = OpenSource(api, url, &handle, requests, text);
-
-    uint64_t sourceSize = 0;
-    while (result == 0) {
-        const uint32_t sizeResult = api->GetSourceSize(handle, &sourceSize);
-        if (sizeResult == KA_ERR_DOWNLOAD_FAILED) {
-            result = sizeResult;
-        } else if (sizeResult == 0 || IsStopped(stopFlag)) {
-            break;
-        } else {
-            SleepMs(kPollMs);
+// Reads size bytes into the caller's buffer (grown to three times the size when too small) or
+// into one from the record's allocator, and fills the record's buffer, size and capacity.
+uint32_t ReadIntoTarget(SourceIOApi* api, void* handle, DownloadRecord* record,
+                        const HostBuffer* target, uint32_t size, KA_BOOL* stopFlag) {
+    // Hosts are given three times the source size of room.
+    const uint32_t room = size * 3;
+    uint8_t* dst = nullptr;
+    uint32_t* count = nullptr;
+    if (target != nullptr) {
+        uint8_t** buffer = target->buffer;
+        if (*target->capacity < room || (*buffer == nullptr && room != 0)) {
+            uint8_t* old = *buffer;
+            delete[] old;
+            *buffer = new (std::nothrow) uint8_t[room];
+            *target->capacity = *buffer != nullptr ? room : 0;
         }
+        if (*buffer == nullptr && room != 0) return KA_ERR_LOAD_FAILED;
+        if (*buffer != nullptr && *target->capacity != 0) memset(*buffer, 0, *target->capacity);
+        *target->bytesRead = size;
+        dst = *buffer;
+        count = target->bytesRead;
+    } else if (record->allocator == nullptr || record->allocator->Allocate == nullptr) {
+        return KA_ERR_LOAD_FAILED;
+    } else {
+        record->size = size;
+        record->capacity = room;
+        record->allocator->Allocate(record->allocator->context, &record->buffer, room);
+        // A host allocator that failed must not turn into a write through null.
+        if (record->buffer == nullptr && size != 0) return KA_ERR_LOAD_FAILED;
+        dst = record->buffer;
+        count = &record->size;
+    }
+    const uint32_t result = ReadWhole(api, handle, dst, count, stopFlag);
+    if (result == 0 && target != nullptr) {
+        record->buffer = *target->buffer;
+        record->size = *target->bytesRead;
+        record->capacity = room;
+    }
+    return result;
+}
+
+// After a complete read: the URL reached after redirects into the record and the module's
+// response into the host's out record. A stop flag set by now fails the download.
+uint32_t FinishRecord(SourceIOApi* api, void* handle, char* url, DownloadRecord* record,
+                      const HostRequest& request) {
+    ka::SourceFinalUrlQuery query = {url, static_cast<uint32_t>(strlen(url)), record->finalURL,
+                                     ka::kUrlSize};
+    if (api->GetParam(handle, ka::kSioFinalUrl, &query) != 0) {
+        memcpy(record->finalURL, url, sizeof(record->finalURL));
+    }
+    record->finalURL[sizeof(record->finalURL) - 1] = '\0';
+    if (IsStopped(request.stopFlag)) return KA_ERR_LOAD_FAILED;
+    if (request.outRecord != nullptr) {
+        api->GetParam(handle, ka::kSioResponseInfo, request.outRecord);
+    }
+    return 0;
+}
+
+// The work shared by DownloadToBuffer (target set) and DownloadWithAllocator (target null).
+uint32_t HostDownload(SourceIOApi* api, const HostRequest& request, DownloadRecord* record,
+                      const HostBuffer* target) {
+    if (record == nullptr) return KA_ERR_NULL_ARGUMENT;
+    if (target != nullptr && (target->buffer == nullptr || target->capacity == nullptr ||
+                              target->bytesRead == nullptr)) {
+        return KA_ERR_NULL_ARGUMENT;
+    }
+    char url[ka::kUrlSize] = {};
+    ResolveUrl(record, request.useBase, url);
+    if (!HasHostOperations(api)) return KA_ERR_DOWNLOAD_OPEN;
+
+    void* handle = nullptr;
+    uint64_t sourceSize = 0;
+    uint32_t result = OpenSource(api, url, &handle, request.requests, request.text);
+    if (result == 0) {
+        result =
+            PollSourceSize(api, handle, request.stopFlag, &sourceSize, StopCheck::kAfterEachAsk);
     }
     if (result == 0 && sourceSize > KA_DOWNLOAD_MAX_SIZE) result = KA_ERR_LOAD_FAILED;
-
     if (result == 0) {
-        const uint32_t size = static_cast<uint32_t>(sourceSize);
-        // Hosts are given three times the source size of room.
-        const uint32_t room = size * 3;
-        uint8_t* target = nullptr;
-        uint32_t* count = nullptr;
-        if (toBuffer) {
-            if (*capacity < room || (*buffer == nullptr && room != 0)) {
-                uint8_t* old = *buffer;
-                delete[] old;
-                *buffer = new (std::nothrow) uint8_t[room];
-                *capacity = *buffer != nullptr ? room : 0;
-            }
-            if (*buffer == nullptr && room != 0) {
-                result = KA_ERR_LOAD_FAILED;
-            } else {
-                if (*buffer != nullptr && *capacity != 0) memset(*buffer, 0, *capacity);
-                *bytesRead = size;
-                target = *buffer;
-                count = bytesRead;
-            }
-        } else if (record->allocator == nullptr || record->allocator->Allocate == nullptr) {
-            result = KA_ERR_LOAD_FAILED;
-        } else {
-            record->size = size;
-            record->capacity = room;
-            record->allocator->Allocate(record->allocator->context, &record->buffer, room);
-            // A host allocator that failed must not turn into a write through null.
-            if (record->buffer == nullptr && size != 0) {
-                result = KA_ERR_LOAD_FAILED;
-            } else {
-                target = record->buffer;
-                count = &record->size;
-            }
-        }
-        if (result == 0) {
-            result = ReadSourceData(api, handle, target, count, stopFlag, kNoRetryLimit);
-        }
-        if (result == 0 && toBuffer) {
-            record->buffer = *buffer;
-            record->size = *bytesRead;
-            record->capacity = room;
-        }
+        result = ReadIntoTarget(api, handle, record, target, static_cast<uint32_t>(sourceSize),
+                                request.stopFlag);
     }
-
-    if (result == 0) {
-        ka::SourceFinalUrlQuery query = {url, static_cast<uint32_t>(strlen(url)), record->finalURL,
-                                         ka::kUrlSize};
-        if (api->GetParam(handle, ka::kSioFinalUrl, &query) != 0) {
-            memcpy(record->finalURL, url, sizeof(record->finalURL));
-        }
-        record->finalURL[sizeof(record->finalURL) - 1] = '\0';
-        if (IsStopped(stopFlag)) {
-            result = KA_ERR_LOAD_FAILED;
-        } else if (outRecord != nullptr) {
-            api->GetParam(handle, ka::kSioResponseInfo, outRecord);
-        }
-    }
-
+    if (result == 0) result = FinishRecord(api, handle, url, record, request);
     ReleaseSource(api, handle);
     return result;
 }
@@ -250,34 +295,21 @@ uint32_t ka_download_by_url(char* url, unsigned char** data, uint32_t* size, cha
     api.SetParam(nullptr, ka::kSioWorkPath, workPath);
 
     void* handle = nullptr;
+    uint64_t sourceSize = 0;
     uint32_t result = OpenSource(&api, url, &handle, nullptr, nullptr);
     if (result == 0) {
-        uint64_t sourceSize = 0;
-        bool failed = false;
-        if (!IsStopped(stopFlag)) {
-            do {
-                const uint32_t sizeResult = api.GetSourceSize(handle, &sourceSize);
-                if (sizeResult == KA_ERR_DOWNLOAD_FAILED) {
-                    result = sizeResult;
-                    failed = true;
-                    break;
-                }
-                if (sizeResult == 0) break;
-                SleepMs(kPollMs);
-            } while (!IsStopped(stopFlag));
-        }
-        if (!failed) {
-            uint32_t count = static_cast<uint32_t>(sourceSize);
-            uint8_t* buffer = new (std::nothrow) uint8_t[count];
-            if (buffer == nullptr) {
-                result = KA_ERR_LOAD_FAILED;
-            } else {
-                memset(buffer, 0, count);
-                *data = buffer;
-                *size = count;
-                result = ReadSourceData(&api, handle, buffer, size, stopFlag, kNoRetryLimit,
-                                        kNoTimeLimit);
-            }
+        result = PollSourceSize(&api, handle, stopFlag, &sourceSize, StopCheck::kBeforeEachAsk);
+    }
+    if (result == 0) {
+        uint32_t count = static_cast<uint32_t>(sourceSize);
+        uint8_t* buffer = new (std::nothrow) uint8_t[count];
+        if (buffer == nullptr) {
+            result = KA_ERR_LOAD_FAILED;
+        } else {
+            memset(buffer, 0, count);
+            *data = buffer;
+            *size = count;
+            result = ReadWhole(&api, handle, buffer, size, stopFlag);
         }
     }
     ReleaseSource(&api, handle);
@@ -289,14 +321,15 @@ uint32_t DownloadToBuffer(SourceIOApi* api, void* request1, void* request2, void
                           uint32_t* capacity, uint32_t* bytesRead, KA_BOOL* stopFlag,
                           KA_BOOL useBase, void* outRecord, char* text) {
     void* const requests[] = {request1, request2, request3, request4};
-    return HostDownload(api, requests, record, buffer, capacity, bytesRead, stopFlag, useBase,
-                        outRecord, text, true);
+    const HostRequest request = {requests, text, outRecord, stopFlag, useBase};
+    const HostBuffer target = {buffer, capacity, bytesRead};
+    return HostDownload(api, request, record, &target);
 }
 
 uint32_t DownloadWithAllocator(SourceIOApi* api, void* request1, void* request2, void* request3,
                                void* request4, DownloadRecord* record, KA_BOOL* stopFlag,
                                KA_BOOL useBase, void* outRecord, char* text) {
     void* const requests[] = {request1, request2, request3, request4};
-    return HostDownload(api, requests, record, nullptr, nullptr, nullptr, stopFlag, useBase,
-                        outRecord, text, false);
+    const HostRequest request = {requests, text, outRecord, stopFlag, useBase};
+    return HostDownload(api, request, record, nullptr);
 }

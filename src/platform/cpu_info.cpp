@@ -9,9 +9,6 @@
 #include <cstdlib>
 #include <cstring>
 
-#include "platform/bounded_string.h"
-#include "platform/lib_loader.h"
-
 namespace {
 
 // The kernel's description of a many-core processor is long; what matters sits near its start.
@@ -201,22 +198,3 @@ int CCpuInfo::read_file(const char* path, char* buffer, unsigned long size) {
 }
 
 int get_cpu_info(CpuInfoRecord* info) { return CCpuInfo::getInfo(info); }
-
-namespace ka {
-
-void ApplyCpuRecord(CLibLoader& loader, const CpuInfoRecord& info) {
-    if (info.type == KA_CPU_TYPE_ARM && (info.features & KA_CPU_FEATURE_NEON) != 0) {
-        CopyBounded(loader.mLibSuffix, sizeof(loader.mLibSuffix), "_v7.so");
-    }
-    loader.mCpuCount = info.count;
-}
-
-void ApplyCpuDefaults(CLibLoader& loader, const char* name) {
-    // Loaders of video decoders keep the plain defaults: one core, no variant suffix.
-    if (name != nullptr && strstr(name, "VidDec") != nullptr) return;
-    CpuInfoRecord info = {};
-    if (get_cpu_info(&info) != 0) return;
-    ApplyCpuRecord(loader, info);
-}
-
-}  // namespace ka

@@ -8,8 +8,6 @@
 
 #include "ka/cpu_info.h"
 
-class CLibLoader;
-
 // Where the description comes from; the real files in production, test files in tests.
 struct CpuInfoSources {
     const char* cpuinfo;  // the processor description ("/proc/cpuinfo")
@@ -53,11 +51,5 @@ namespace ka {
 
 // The real files cpu_init reads.
 extern const CpuInfoSources kKernelCpuSources;
-
-// The loader's CPU-dependent defaults from a record: the "_v7.so" variants on ARM with NEON, and
-// the core count.
-void ApplyCpuRecord(CLibLoader& loader, const CpuInfoRecord& info);
-// What both loader constructors do last; a name containing "VidDec" leaves the defaults alone.
-void ApplyCpuDefaults(CLibLoader& loader, const char* name);
 
 }  // namespace ka

@@ -5,12 +5,8 @@
 #include <cstring>
 
 #include "platform/bounded_string.h"
-#include "platform/cpu_info.h"
 
 namespace {
-
-// The service loads every module with the dynamic loader's RTLD_NOW.
-constexpr int kLoadNow = 2;
 
 // Codec modules that come in a CPU variant ("_v7.so") on processors that can use it.
 const char* const kVariantModules[] = {
@@ -26,6 +22,25 @@ bool IsVariantModule(const char* path) {
 }
 
 }  // namespace
+
+namespace ka {
+
+void ApplyCpuRecord(CLibLoader& loader, const CpuInfoRecord& info) {
+    if (info.type == KA_CPU_TYPE_ARM && (info.features & KA_CPU_FEATURE_NEON) != 0) {
+        CopyBounded(loader.mLibSuffix, sizeof(loader.mLibSuffix), "_v7.so");
+    }
+    loader.mCpuCount = info.count;
+}
+
+void ApplyCpuDefaults(CLibLoader& loader, const char* name) {
+    // Loaders of video decoders keep the plain defaults: one core, no variant suffix.
+    if (name != nullptr && strstr(name, "VidDec") != nullptr) return;
+    CpuInfoRecord info = {};
+    if (get_cpu_info(&info) != 0) return;
+    ApplyCpuRecord(loader, info);
+}
+
+}  // namespace ka
 
 CLibLoader::CLibLoader() {
     Init();
@@ -96,7 +111,7 @@ int CLibLoader::LoadLib(void* /*unused*/) {
         ka::AppendBounded(mLibName, sizeof(mLibName), requested);
         if (strstr(requested, ".so") == nullptr) ka::AppendBounded(mLibName, sizeof(mLibName), ".so");
         mLibHandle = LoadVariantLib(mLibName);
-        if (mLibHandle == nullptr) mLibHandle = mLoadLibrary(mLibName, kLoadNow);
+        if (mLibHandle == nullptr) mLibHandle = mLoadLibrary(mLibName, ka::kModuleLoadNow);
         if (mLibHandle == nullptr) return 0;
     } else {
         // A name with a directory in it is a path: nothing else is tried.
@@ -105,7 +120,7 @@ int CLibLoader::LoadLib(void* /*unused*/) {
         for (const char* prefix : prefixes) {
             ka::CopyBounded(mLibName, sizeof(mLibName), prefix);
             ka::AppendBounded(mLibName, sizeof(mLibName), requested);
-            mLibHandle = mLoadLibrary(mLibName, kLoadNow);
+            mLibHandle = mLoadLibrary(mLibName, ka::kModuleLoadNow);
             if (mLibHandle != nullptr || isPath) break;
         }
         if (mLibHandle == nullptr) return 0;
@@ -137,7 +152,7 @@ void* CLibLoader::LoadVariantLib(char* path) {
 
     LoadModuleService();
     if (mLoadLibrary == nullptr) return nullptr;
-    void* handle = mLoadLibrary(variant, kLoadNow);
+    void* handle = mLoadLibrary(variant, ka::kModuleLoadNow);
     if (handle != nullptr) ka::CopyBounded(mLibName, sizeof(mLibName), variant);
     return handle;
 }

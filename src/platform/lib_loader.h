@@ -3,6 +3,8 @@
 // resolves the module's single entry function.
 #pragma once
 
+#include "ka/cpu_info.h"
+#include "module_service_api.h"
 #include "platform/limits.h"
 #include "platform/sdk_object.h"
 
@@ -10,10 +12,6 @@ struct ModuleContext;  // supplied by the host, never dereferenced here
 
 // A module's entry function fills the module's table of operations; its result is not used.
 typedef int (*KaModuleEntry)(void* api);
-// The three functions of the module-loading service.
-typedef void* (*KaLoadLibraryFn)(const char* name, int flags);
-typedef void* (*KaGetAddressSymbolFn)(void* handle, const char* symbol);
-typedef int (*KaFreeLibraryFn)(void* handle);
 
 class CLibLoader : public CSDKObject {
 public:
@@ -54,3 +52,13 @@ public:
 private:
     void Init();
 };
+
+namespace ka {
+
+// The loader's CPU-dependent defaults from a record: the "_v7.so" variants on ARM with NEON, and
+// the core count.
+void ApplyCpuRecord(CLibLoader& loader, const CpuInfoRecord& info);
+// What both loader constructors do last; a name containing "VidDec" leaves the defaults alone.
+void ApplyCpuDefaults(CLibLoader& loader, const char* name);
+
+}  // namespace ka

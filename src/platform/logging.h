@@ -4,23 +4,15 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "log_library_api.h"
+
 namespace ka {
 
-// Entry points of libkaLogSys.so. Only the print functions and the error text are called; the
-// others must merely exist (kaLogDllSetParam not even that).
-typedef int (*LogDllInitFn)();
-typedef int (*LogDllGetMaxLevelFn)();
-typedef int (*LogDllPrintFn)(int level, const char* text);
-typedef int (*LogDllUninitFn)();
-typedef int (*LogDllGetErrMsgFn)(uint32_t code, char* buffer);
-typedef int (*LogDllSetParamFn)(int id, void* value);
-
-// Buffer sizes of the print variants and of the error text.
+// Buffer sizes of the print variants (the error text's is the logging library's contract).
 constexpr size_t kLogPathSize = 1024;
 constexpr size_t kLogLineSize = 2048;
 constexpr size_t kLogExtendedLineSize = 5120;
 constexpr size_t kLogConstLineSize = 4096;
-constexpr size_t kLogErrorTextSize = 2048;
 
 struct LogLibrary {
     void* handle;  // dlopen handle; null: nothing is logged

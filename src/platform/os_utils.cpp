@@ -10,6 +10,8 @@
 #include <cstdio>
 #include <cstring>
 
+#include "platform/cpu_info.h"
+
 namespace {
 
 // A clock base: the first reading of a clock, zero until taken. The first readings of two
@@ -82,16 +84,6 @@ bool ReadNumber(const char* path, unsigned long* value) {
     return converted == 1;
 }
 
-int CountCpus() {
-    // Only odd numbers are probed: cores come in pairs on the devices this serves.
-    char path[64];
-    for (int n = 21; n >= 1; n -= 2) {
-        snprintf(path, sizeof(path), "/sys/devices/system/cpu/cpu%d", n);
-        if (access(path, F_OK) == 0) return n + 1;
-    }
-    return 1;
-}
-
 }  // namespace
 
 int SleepMs(uint32_t ms) { return usleep(static_cast<useconds_t>(ms) * 1000); }
@@ -143,9 +135,10 @@ int GetAppDir(char* buffer, uint32_t size) {
     return 0;
 }
 
-int GetCpuCount(void) { return CountCpus(); }
+// The probe of get_cpu_info's core count, made afresh on each call.
+int GetCpuCount(void) { return CCpuInfo::count_cpu(); }
 
-int GetCpuNum(void) { return CountCpus(); }
+int GetCpuNum(void) { return CCpuInfo::count_cpu(); }
 
 uint32_t GetCpuLoad(uint32_t* systemPercent, uint32_t* userPercent, KA_BOOL* running,
                     uint32_t interval, uint32_t step) {

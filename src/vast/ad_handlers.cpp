@@ -4,8 +4,7 @@
 #include "ka/result_codes.h"
 #include "ka/vast_extension.h"
 #include "vast/vast_parser.h"
-#include "xml/element_values.h"
-#include "xml/text_helpers.h"
+#include "xml/text.h"
 
 using ka::NameIs;
 
@@ -27,10 +26,10 @@ unsigned int CVASTParser::LoadVASTTag(void* node, void* target, char* name,
 
 unsigned int CVASTParser::LoadAdAttributes(void* node, AdData* ad) {
     if (node == nullptr || ad == nullptr) return KA_OK;
-    ka::CopyAttribute(*this, node, "id", ad->id);
+    CopyAttribute(node, "id", ad->id);
     char* value = nullptr;
     int length = 0;
-    if (ka::ReadAttribute(*this, node, "sequence", &value, length)) ad->sequence = atoi(value);
+    if (ReadAttribute(node, "sequence", &value, length)) ad->sequence = atoi(value);
     return KA_OK;
 }
 
@@ -79,20 +78,20 @@ unsigned int CVASTParser::LoadInLineTag(void* node, void* target, char* name,
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
     AdInLine* inLine = static_cast<AdInLine*>(target);
     if (NameIs(name, nameLength, "AdSystem")) {
-        ka::ReadRawText(*this, node, inLine->adSystem);
+        ReadElementText(node, inLine->adSystem, TextForm::kRaw);
     } else if (NameIs(name, nameLength, "AdTitle")) {
-        ka::ReadRawText(*this, node, inLine->adTitle);
+        ReadElementText(node, inLine->adTitle, TextForm::kRaw);
     } else if (NameIs(name, nameLength, "Impression")) {
         // Counted even when empty: the count says how many elements the ad had.
         inLine->impressionCount++;
         AppendImpression(*this, node, &inLine->impressions, mImpressionTail);
     } else if (NameIs(name, nameLength, "Description")) {
-        ka::ReadRawText(*this, node, inLine->description);
+        ReadElementText(node, inLine->description, TextForm::kRaw);
     } else if (NameIs(name, nameLength, "Advertiser")) {
-        ka::ReadRawText(*this, node, inLine->advertiser);
+        ReadElementText(node, inLine->advertiser, TextForm::kRaw);
     } else if (NameIs(name, nameLength, "Survey")) {
         // Survey URLs carry query strings: the one raw text that gets "&amp;" decoded.
-        if (ka::ReadRawText(*this, node, inLine->survey)) unescape_amp(inLine->survey);
+        if (ReadElementText(node, inLine->survey, TextForm::kRaw)) unescape_amp(inLine->survey);
     } else if (NameIs(name, nameLength, "Error")) {
         GetElementText(node, inLine->error);
     } else if (NameIs(name, nameLength, "Creatives")) {
@@ -119,7 +118,7 @@ unsigned int CVASTParser::LoadWrapperTag(void* node, void* target, char* name,
     AdWrapper* wrapper = static_cast<AdWrapper*>(static_cast<AdData*>(target)->body);
     if (wrapper == nullptr) return KA_OK;
     if (NameIs(name, nameLength, "AdSystem")) {
-        ka::ReadRawText(*this, node, wrapper->adSystem);
+        ReadElementText(node, wrapper->adSystem, TextForm::kRaw);
     } else if (NameIs(name, nameLength, "VASTAdTagURI")) {
         GetElementText(node, wrapper->vastAdTagUri);
     } else if (NameIs(name, nameLength, "Error")) {

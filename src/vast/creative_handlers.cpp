@@ -3,7 +3,7 @@
 
 #include "ka/result_codes.h"
 #include "vast/vast_parser.h"
-#include "xml/element_values.h"
+#include "xml/text.h"
 
 using ka::NameIs;
 
@@ -21,13 +21,13 @@ unsigned int CVASTParser::LoadCreative(void* node, void* target, char* name,
 
 unsigned int CVASTParser::LoadCreativeAttributes(void* node, AdCreative* creative) {
     if (node == nullptr || creative == nullptr) return KA_OK;
-    ka::CopyAttribute(*this, node, "id", creative->id);
+    CopyAttribute(node, "id", creative->id);
     char* value = nullptr;
     int length = 0;
-    if (ka::ReadAttribute(*this, node, "sequence", &value, length)) {
+    if (ReadAttribute(node, "sequence", &value, length)) {
         creative->sequence = atoi(value);
     }
-    ka::CopyAttribute(*this, node, "adId", creative->adId);
+    CopyAttribute(node, "adId", creative->adId);
     return KA_OK;
 }
 

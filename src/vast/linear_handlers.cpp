@@ -4,8 +4,7 @@
 
 #include "ka/result_codes.h"
 #include "vast/vast_parser.h"
-#include "xml/element_values.h"
-#include "xml/text_helpers.h"
+#include "xml/text.h"
 
 using ka::NameIs;
 
@@ -20,7 +19,7 @@ bool IsPercent(const char* value, int length) {
 void ReadNumber(CXMLDocument& doc, void* node, const char* name, int32_t& field) {
     char* value = nullptr;
     int length = 0;
-    if (ka::ReadAttribute(doc, node, name, &value, length)) field = atoi(value);
+    if (doc.ReadAttribute(node, name, &value, length)) field = atoi(value);
 }
 
 // A click element appended to one of the lists of an AdVideoClicks.
@@ -29,7 +28,7 @@ void AppendClick(CXMLDocument& doc, void* node, uint32_t& count, AdClick** list,
     count++;
     AdClick* click = new AdClick();
     tail.Append(list, click);
-    ka::CopyAttribute(doc, node, "id", click->id);
+    doc.CopyAttribute(node, "id", click->id);
     doc.GetElementText(node, click->url);
 }
 
@@ -69,7 +68,7 @@ unsigned int CVASTParser::LoadSkipOffset(void* node, AdLinear* linear) {
     if (node == nullptr || linear == nullptr) return KA_OK;
     char* value = nullptr;
     int length = 0;
-    if (!ka::ReadAttribute(*this, node, "skipoffset", &value, length)) {
+    if (!ReadAttribute(node, "skipoffset", &value, length)) {
         linear->skipOffset = -1;
         return KA_OK;
     }
@@ -104,7 +103,7 @@ unsigned int CVASTParser::LoadMediaFileAttributes(void* node, AdMediaFile* media
     if (node == nullptr || mediaFile == nullptr) return KA_OK;
     char* value = nullptr;
     int length = 0;
-    if (ka::ReadAttribute(*this, node, "delivery", &value, length)) {
+    if (ReadAttribute(node, "delivery", &value, length)) {
         unsigned int size = static_cast<unsigned int>(length);
         if (NameIs(value, size, "progressive")) {
             mediaFile->delivery = AD_DELIVERY_PROGRESSIVE;
@@ -112,10 +111,10 @@ unsigned int CVASTParser::LoadMediaFileAttributes(void* node, AdMediaFile* media
             mediaFile->delivery = AD_DELIVERY_STREAMING;
         }
     }
-    ka::CopyAttribute(*this, node, "type", mediaFile->type);
+    CopyAttribute(node, "type", mediaFile->type);
     ReadNumber(*this, node, "width", mediaFile->width);
     ReadNumber(*this, node, "height", mediaFile->height);
-    ka::CopyAttribute(*this, node, "codec", mediaFile->codec);
+    CopyAttribute(node, "codec", mediaFile->codec);
     ReadNumber(*this, node, "id", mediaFile->id);
     ReadNumber(*this, node, "bitrate", mediaFile->bitrate);
     ReadNumber(*this, node, "minBitrate", mediaFile->minBitrate);
@@ -156,10 +155,10 @@ unsigned int CVASTParser::LoadTrackingEventsTag(void* node, void* target, char* 
 
 unsigned int CVASTParser::LoadTrackingAttributes(void* node, AdTracking* tracking) {
     if (node == nullptr || tracking == nullptr) return KA_OK;
-    ka::CopyAttribute(*this, node, "event", tracking->event);
+    CopyAttribute(node, "event", tracking->event);
     char* value = nullptr;
     int length = 0;
-    if (!ka::ReadAttribute(*this, node, "offset", &value, length)) return KA_OK;
+    if (!ReadAttribute(node, "offset", &value, length)) return KA_OK;
     if (IsPercent(value, length)) {
         // A percentage of the duration, kept as the number written (two characters at most).
         long long percent = 0;

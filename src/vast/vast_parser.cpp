@@ -12,8 +12,7 @@ CVASTParser::CVASTParser()
       mExtensionParser(nullptr),
       mMergeWrappers(1),
       mStopFlag(nullptr),
-      mFetchesLeft(ka::kMaxWrapperFetches),
-      mFetchBudget(&mFetchesLeft) {}
+      mFetchesLeft(ka::kMaxWrapperFetches) {}
 
 CVASTParser::~CVASTParser() { CVASTParser::Close(); }
 
@@ -33,13 +32,16 @@ unsigned int CVASTParser::Close() {
 
 unsigned int CVASTParser::Process(void* buffer, unsigned int size, KA_BOOL mergeWrappers,
                                   KA_BOOL* stopFlag) {
-    mMergeWrappers = mergeWrappers;
-    mStopFlag = stopFlag;
-    // The caller's own document starts a new chain; a wrapped one spends its top's budget.
-    if (mVastAdData.depth == 0) {
-        mFetchesLeft = ka::kMaxWrapperFetches;
-        mFetchBudget = &mFetchesLeft;
-    }
+    // The caller's own document starts a new chain.
+    ka::ChainContext chain = ka::ChainContext::Start(mergeWrappers, stopFlag, mWorkPath);
+    const unsigned int result = ProcessInChain(buffer, size, chain);
+    mFetchesLeft = chain.fetchesLeft;
+    return result;
+}
+
+unsigned int CVASTParser::ProcessInChain(void* buffer, unsigned int size, ka::ChainContext& chain) {
+    mMergeWrappers = chain.mergeWrappers;
+    mStopFlag = chain.stopFlag;
     // The module takes the size as an int: a larger buffer cannot be loaded.
     if (buffer == nullptr || size > static_cast<unsigned int>(INT_MAX)) return KA_ERR_LOAD_FAILED;
     if (LoadXML(static_cast<char*>(buffer), static_cast<int>(size), ka::kXmlLoadMode) != 0) {
@@ -49,7 +51,7 @@ unsigned int CVASTParser::Process(void* buffer, unsigned int size, KA_BOOL merge
     GetFirstChild(nullptr, &root);
     if (root == nullptr) return KA_ERR_LOAD_FAILED;
     // Whatever the root is called, its children are read as those of <VAST>.
-    ParseVASTNode(root, true, mergeWrappers != 0);
+    ParseVASTNodeInChain(root, true, chain.mergeWrappers != 0, chain);
     return KA_OK;
 }
 
@@ -63,24 +65,36 @@ unsigned int CVASTParser::SetParam(unsigned int id, void* value) {
 unsigned int CVASTParser::GetParam(unsigned int /*id*/, void* /*value*/) { return KA_OK; }
 
 unsigned int CVASTParser::ParseVASTNode(void* node, bool ownsDocument, bool mergeWrappers) {
+    ka::ChainContext chain = {mMergeWrappers, mStopFlag, mFetchesLeft, mWorkPath};
+    ParseVASTNodeInChain(node, ownsDocument, mergeWrappers, chain);
+    mFetchesLeft = chain.fetchesLeft;
+    return KA_OK;
+}
+
+unsigned int CVASTParser::ParseVASTNodeInChain(void* node, bool ownsDocument, bool mergeWrappers,
+                                               ka::ChainContext& chain) {
     ResetTails();
     LoadTag(node, &mVastAdData, &CVASTParser::LoadVASTTag);
     ResetTails();
     // The document and the module go before any wrapper is fetched: along a chain of wrappers
     // only one fetched document is loaded at a time.
     if (ownsDocument) Close();
-    WalkWrappers(mergeWrappers);
+    WalkWrappers(mergeWrappers, chain);
     return KA_OK;
 }
 
-void CVASTParser::WalkWrappers(bool mergeWrappers) {
+void CVASTParser::ForgetVastAdData() { mVastAdData = VastAdData(); }
+
+void CVASTParser::WalkWrappers(bool mergeWrappers, ka::ChainContext& chain) {
     for (AdData* ad = mVastAdData.firstAd; ad != nullptr;) {
         // The wrapper chain rewrites the node in place, so the next one is taken first.
         AdData* next = ad->next;
         if (ad->type == AD_TYPE_WRAPPER && ad->body != nullptr) {
             if (mVastAdData.depth >= mMaxDepth) break;
             // A failed fetch leaves no nested parser, and the merge then leaves the ad as read.
-            if (static_cast<AdWrapper*>(ad->body)->vastAdTagUri != nullptr) FetchWrapper(ad);
+            if (static_cast<AdWrapper*>(ad->body)->vastAdTagUri != nullptr) {
+                FetchWrapper(ad, chain);
+            }
             if (mergeWrappers) MergeWrapper(ad);
         }
         ad = next;

@@ -4,9 +4,12 @@
 // element, and the handlers fill the records.
 #pragma once
 
+#include <cstddef>
+
 #include "ka/types.h"
 #include "ka/vast_records.h"
-#include "xml/list_tail.h"
+#include "vast/chain_context.h"
+#include "xml/record_lists.h"
 #include "xml/xml_document.h"
 
 class CExtensionParser;
@@ -35,8 +38,18 @@ public:
     virtual unsigned int SetParam(unsigned int id, void* value);
     // Reports nothing; always 0.
     virtual unsigned int GetParam(unsigned int id, void* value);
-    // Reads the children of a VAST element into mVastAdData, then walks its Wrapper ads.
+    // Reads the children of a VAST element into mVastAdData, then walks its Wrapper ads. The
+    // element heads a chain of its own, with this parser's flags and the fetches it has left.
     virtual unsigned int ParseVASTNode(void* node, bool ownsDocument, bool mergeWrappers);
+
+    // Process and ParseVASTNode as a part of the given chain: a wrapped document, or a VAST
+    // element of the VMAP parser's document. ProcessInChain takes its flags from the chain.
+    unsigned int ProcessInChain(void* buffer, unsigned int size, ka::ChainContext& chain);
+    unsigned int ParseVASTNodeInChain(void* node, bool ownsDocument, bool mergeWrappers,
+                                      ka::ChainContext& chain);
+    // Forgets the records of mVastAdData without releasing them: whoever copied the container
+    // owns them now.
+    void ForgetVastAdData();
 
     // Calls handler for every child element of node that has a non-empty name; always 0.
     unsigned int LoadTag(void* node, void* target, TagHandler handler);
@@ -67,10 +80,11 @@ public:
     unsigned int LoadTrackingAttributes(void* node, AdTracking* tracking);
 
     // Wrapper chain (wrapper_chain.cpp).
-    // Downloads the ad's vastAdTagUri and parses it with a nested parser one level deeper,
-    // which the wrapper body then owns. 0 when there is nothing to fetch, 0x91001000 when the
-    // download fails or is empty, otherwise the nested Process result.
-    unsigned int FetchWrapper(AdData* ad);
+    // Downloads the ad's vastAdTagUri and parses it with a nested parser one level deeper, in
+    // the same chain, which the wrapper body then owns. 0 when there is nothing to fetch,
+    // 0x91001000 when the chain has no fetch left or the download fails or is empty, otherwise
+    // the nested Process result.
+    unsigned int FetchWrapper(AdData* ad, ka::ChainContext& chain);
     // Puts the first ad of the nested parser's result in the wrapper ad's place and copies the
     // wrapper's impressions, click tracking and tracking events into it; destroys the nested
     // parser. Leaves the ad as it is without a nested parser. Always 0.
@@ -78,16 +92,17 @@ public:
     // Copies the tracking of the wrapper's Linear creatives into every Linear creative of
     // inlineCreatives.
     unsigned int MergeCreatives(AdWrapper* wrapper, AdCreative* inlineCreatives);
-    // Appends copies of wrapperCreative's click tracking, custom clicks and tracking events to
-    // those of inlineCreative (both Linear) and sets their counts to the list lengths.
+    // MergeCreatives for one pair: appends copies of wrapperCreative's click tracking, custom
+    // clicks and tracking events to those of inlineCreative (both Linear) and sets their counts
+    // to the list lengths.
     unsigned int MergeLinear(AdCreative* wrapperCreative, AdCreative* inlineCreative);
     // Deep copies in list order, each node and string newly allocated; null for a null list.
     AdImpression* CopyImpressionList(AdImpression* list);
     AdClick* CopyClickList(AdClick* list);
     AdTracking* CopyTrackingList(AdTracking* list);
 
-    // Releases (vast_release.cpp): free everything below the record, null what they freed,
-    // accept null and always return 0. They use no parser state.
+    // Releases (vast_release.cpp): forward to the functions of vast_release.h, which free
+    // everything below the record, null what they freed, accept null and always return 0.
     unsigned int ReleaseVastAdData(VastAdData* data);
     // Frees the ad's id and body; the node itself, its sequence, type and next stay.
     unsigned int ReleaseAdData(AdData* ad);
@@ -99,18 +114,21 @@ public:
     CExtensionParser* mExtensionParser;  // owned; null when none is installed
     KA_BOOL mMergeWrappers;              // merge flag of the last Process, for nested parsers
     KA_BOOL* mStopFlag;                  // stop flag of the last Process; null without one
-    unsigned int mFetchesLeft;           // fetches this parser may still start as a chain's top
-    unsigned int* mFetchBudget;          // the top parser's mFetchesLeft, shared down a chain
+    unsigned int mFetchesLeft;           // fetches left to the last chain this parser headed
 
 private:
     // <Extensions> of an InLine or Wrapper into its extensions field: the Parse result.
     unsigned int LoadExtensions(void* node, CAdExtensions*& extensions);
     // Wrapper ads of mVastAdData, in list order, while this document is above the depth limit.
-    void WalkWrappers(bool mergeWrappers);
+    void WalkWrappers(bool mergeWrappers, ka::ChainContext& chain);
+    // The one merge primitive of MergeCreatives and MergeLinear: appends copies of the click
+    // tracking, custom clicks (of each source's first VideoClicks) and tracking events of count
+    // Linear sources, in their order, to target, walking each list of target to its end once.
+    void AppendLinearTracking(AdLinear* target, AdLinear* const* sources, size_t count);
     // Forgets the remembered list ends; called around every walk and by every release.
     void ResetTails();
 
-    // Last nodes appended, one per kind of list being filled (list_tail.h).
+    // Last nodes appended, one per kind of list being filled (record_lists.h).
     ka::ListTail<AdData> mAdTail;
     ka::ListTail<AdImpression> mImpressionTail;
     ka::ListTail<AdCreative> mCreativeTail;

@@ -1,4 +1,6 @@
 // Releases of the VAST records. Lists are freed node by node with loops, whatever their length.
+#include "vast/vast_release.h"
+
 #include "ka/result_codes.h"
 #include "ka/vast_extension.h"
 #include "vast/vast_parser.h"
@@ -48,12 +50,12 @@ void FreeExtensions(CAdExtensions*& extensions) {
 }
 
 // Frees a creative list in list order; the linear content goes through ReleaseLinear.
-void FreeCreatives(CVASTParser& parser, AdCreative*& list) {
+void FreeCreatives(AdCreative*& list) {
     while (list != nullptr) {
         AdCreative* next = list->next;
         FreeString(list->id);
         FreeString(list->adId);
-        if (list->kind == AD_CREATIVE_LINEAR) parser.ReleaseLinear(&list->content);
+        if (list->kind == AD_CREATIVE_LINEAR) ka::ReleaseLinear(&list->content);
         delete list;
         list = next;
     }
@@ -61,9 +63,10 @@ void FreeCreatives(CVASTParser& parser, AdCreative*& list) {
 
 }  // namespace
 
-unsigned int CVASTParser::ReleaseVastAdData(VastAdData* data) {
+namespace ka {
+
+unsigned int ReleaseVastAdData(VastAdData* data) {
     if (data == nullptr) return KA_OK;
-    ResetTails();
     FreeString(data->errorUrl);
     AdData* ad = data->firstAd;
     while (ad != nullptr) {
@@ -77,22 +80,21 @@ unsigned int CVASTParser::ReleaseVastAdData(VastAdData* data) {
     return KA_OK;
 }
 
-unsigned int CVASTParser::ReleaseAdData(AdData* ad) {
+unsigned int ReleaseAdData(AdData* ad) {
     if (ad == nullptr) return KA_OK;
-    ResetTails();
     if (ad->type == AD_TYPE_WRAPPER && ad->body != nullptr) {
         AdWrapper* wrapper = static_cast<AdWrapper*>(ad->body);
         FreeString(wrapper->vastAdTagUri);
         FreeString(wrapper->adSystem);
         FreeString(wrapper->error);
         FreeImpressions(wrapper->impressions);
-        FreeCreatives(*this, wrapper->creatives);
+        FreeCreatives(wrapper->creatives);
         FreeExtensions(wrapper->extensions);
         if (wrapper->nestedParser != nullptr) {
             // The wrapped document's records live in the nested parser's own container.
             CVASTParser* nested = wrapper->nestedParser;
             wrapper->nestedParser = nullptr;
-            nested->ReleaseVastAdData(&nested->mVastAdData);
+            ReleaseVastAdData(&nested->mVastAdData);
             delete nested;
         }
         delete wrapper;
@@ -105,7 +107,7 @@ unsigned int CVASTParser::ReleaseAdData(AdData* ad) {
         FreeString(inLine->advertiser);
         FreeString(inLine->survey);
         FreeString(inLine->error);
-        FreeCreatives(*this, inLine->creatives);
+        FreeCreatives(inLine->creatives);
         FreeExtensions(inLine->extensions);
         delete inLine;
     }
@@ -114,9 +116,8 @@ unsigned int CVASTParser::ReleaseAdData(AdData* ad) {
     return KA_OK;
 }
 
-unsigned int CVASTParser::ReleaseLinear(AdLinear* linear) {
+unsigned int ReleaseLinear(AdLinear* linear) {
     if (linear == nullptr) return KA_OK;
-    ResetTails();
     AdMediaFile* mediaFile = linear->mediaFiles;
     for (uint32_t i = 0; i < linear->mediaFileCount && mediaFile != nullptr; ++i) {
         AdMediaFile* next = mediaFile->next;
@@ -145,4 +146,27 @@ unsigned int CVASTParser::ReleaseLinear(AdLinear* linear) {
     FreePlainList(linear->icons, linear->iconCount);
     *linear = AdLinear();
     return KA_OK;
+}
+
+}  // namespace ka
+
+// The members forward to the functions above. Their records may be lists this parser is filling,
+// so the remembered list ends go first.
+
+unsigned int CVASTParser::ReleaseVastAdData(VastAdData* data) {
+    if (data == nullptr) return KA_OK;
+    ResetTails();
+    return ka::ReleaseVastAdData(data);
+}
+
+unsigned int CVASTParser::ReleaseAdData(AdData* ad) {
+    if (ad == nullptr) return KA_OK;
+    ResetTails();
+    return ka::ReleaseAdData(ad);
+}
+
+unsigned int CVASTParser::ReleaseLinear(AdLinear* linear) {
+    if (linear == nullptr) return KA_OK;
+    ResetTails();
+    return ka::ReleaseLinear(linear);
 }

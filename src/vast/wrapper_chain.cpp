@@ -9,44 +9,11 @@
 #include "ka/result_codes.h"
 #include "net/download.h"
 #include "vast/vast_parser.h"
+#include "vast/vast_release.h"
+#include "xml/record_lists.h"
+#include "xml/text.h"
 
 namespace {
-
-char* CopyString(const char* text) {
-    if (text == nullptr) return nullptr;
-    const size_t length = strlen(text);
-    char* copy = new char[length + 1];
-    memcpy(copy, text, length + 1);
-    return copy;
-}
-
-// The end of a list being appended to: the link that receives the next node, and the number
-// of nodes before it. Found with one walk, then moved along each appended copy, so appending
-// many copies to a long list stays linear.
-template <typename T>
-struct ListEnd {
-    T** link;
-    uint32_t count;
-};
-
-template <typename T>
-ListEnd<T> FindEnd(T** head) {
-    ListEnd<T> end = {head, 0};
-    while (*end.link != nullptr) {
-        end.link = &(*end.link)->next;
-        ++end.count;
-    }
-    return end;
-}
-
-template <typename T>
-void Attach(ListEnd<T>& end, T* list) {
-    *end.link = list;
-    while (*end.link != nullptr) {
-        end.link = &(*end.link)->next;
-        ++end.count;
-    }
-}
 
 AdLinear* LinearOf(AdCreative* creative) {
     return creative != nullptr && creative->kind == AD_CREATIVE_LINEAR ? &creative->content
@@ -60,20 +27,19 @@ bool HasClicks(const AdVideoClicks* clicks) {
 
 }  // namespace
 
-unsigned int CVASTParser::FetchWrapper(AdData* ad) {
+unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     if (ad == nullptr || ad->body == nullptr || ad->type != AD_TYPE_WRAPPER) return KA_OK;
     AdWrapper* wrapper = static_cast<AdWrapper*>(ad->body);
 
     // Without a caller's flag (a VAST element of a VMAP document) downloads get one that stays
     // false: the download needs a flag to read.
     KA_BOOL neverStop = 0;
-    KA_BOOL* stopFlag = mStopFlag != nullptr ? mStopFlag : &neverStop;
-    if (mFetchBudget == nullptr || *mFetchBudget == 0) return KA_ERR_LOAD_FAILED;
-    --*mFetchBudget;
+    KA_BOOL* stopFlag = chain.stopFlag != nullptr ? chain.stopFlag : &neverStop;
+    if (!chain.TakeFetch()) return KA_ERR_LOAD_FAILED;
     unsigned char* buffer = nullptr;
     uint32_t size = 0;
     const uint32_t downloaded =
-        ka_download_by_url(wrapper->vastAdTagUri, &buffer, &size, mWorkPath, stopFlag);
+        ka_download_by_url(wrapper->vastAdTagUri, &buffer, &size, chain.workPath, stopFlag);
     if (downloaded != 0 || size == 0 || buffer == nullptr) {
         delete[] buffer;
         return KA_ERR_LOAD_FAILED;
@@ -81,14 +47,12 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad) {
 
     CVASTParser* nested = new CVASTParser();
     wrapper->nestedParser = nested;
-    nested->SetWorkPath(mWorkPath);
+    nested->SetWorkPath(chain.workPath);
     // A failed load shows up as a failed Process below.
     nested->InitXMLParser();
     nested->mVastAdData.depth = mVastAdData.depth + 1;
-    nested->mFetchBudget = mFetchBudget;
     // The nested parser reads the document and runs its own wrappers before this returns.
-    const unsigned int result = nested->Process(buffer, size, mMergeWrappers, mStopFlag);
-    nested->mFetchBudget = &nested->mFetchesLeft;
+    const unsigned int result = nested->ProcessInChain(buffer, size, chain);
     delete[] buffer;
     nested->Close();
     return result;
@@ -106,14 +70,14 @@ unsigned int CVASTParser::MergeWrapper(AdData* ad) {
             AdWrapper* innerWrapper = static_cast<AdWrapper*>(inner->body);
             if (innerWrapper->nestedParser != nullptr) {
                 CVASTParser* deeper = innerWrapper->nestedParser;
-                deeper->ReleaseVastAdData(&deeper->mVastAdData);
+                ka::ReleaseVastAdData(&deeper->mVastAdData);
                 delete deeper;
                 innerWrapper->nestedParser = nullptr;
             }
         } else if (inner->type == AD_TYPE_INLINE && inner->body != nullptr) {
             AdInLine* inLine = static_cast<AdInLine*>(inner->body);
-            ListEnd<AdImpression> end = FindEnd(&inLine->impressions);
-            Attach(end, CopyImpressionList(wrapper->impressions));
+            ka::ListEnd<AdImpression> end = ka::FindEnd(&inLine->impressions);
+            ka::Attach(end, CopyImpressionList(wrapper->impressions));
             inLine->impressionCount = end.count;
             MergeCreatives(wrapper, inLine->creatives);
         }
@@ -143,7 +107,7 @@ unsigned int CVASTParser::MergeWrapper(AdData* ad) {
     ad->sequence = sequence;
 
     // Only the wrapped document's first ad survives.
-    nested->ReleaseVastAdData(&wrapped);
+    ka::ReleaseVastAdData(&wrapped);
     delete nested;
     return KA_OK;
 }
@@ -168,31 +132,7 @@ unsigned int CVASTParser::MergeCreatives(AdWrapper* wrapper, AdCreative* inlineC
 
     for (AdCreative* d = inlineCreatives; d != nullptr; d = d->next) {
         AdLinear* target = LinearOf(d);
-        if (target == nullptr) continue;
-        for (AdVideoClicks* v = target->videoClicks; v != nullptr; v = v->next) {
-            ListEnd<AdClick> trackings = FindEnd(&v->clickTrackings);
-            ListEnd<AdClick> customs = FindEnd(&v->customClicks);
-            bool trackingsCopied = false;
-            bool customsCopied = false;
-            for (AdLinear* source : sources) {
-                // Only the first VideoClicks of the wrapper creative is read.
-                const AdVideoClicks* u = source->videoClicks;
-                if (u == nullptr) continue;
-                if (u->clickTrackings != nullptr) {
-                    Attach(trackings, CopyClickList(u->clickTrackings));
-                    trackingsCopied = true;
-                }
-                if (u->customClicks != nullptr) {
-                    Attach(customs, CopyClickList(u->customClicks));
-                    customsCopied = true;
-                }
-            }
-            if (trackingsCopied) v->clickTrackingCount = trackings.count;
-            if (customsCopied) v->customClickCount = customs.count;
-        }
-        ListEnd<AdTracking> events = FindEnd(&target->trackingEvents);
-        for (AdLinear* source : sources) Attach(events, CopyTrackingList(source->trackingEvents));
-        target->trackingCount = events.count;
+        if (target != nullptr) AppendLinearTracking(target, sources.data(), sources.size());
     }
     return KA_OK;
 }
@@ -200,25 +140,39 @@ unsigned int CVASTParser::MergeCreatives(AdWrapper* wrapper, AdCreative* inlineC
 unsigned int CVASTParser::MergeLinear(AdCreative* wrapperCreative, AdCreative* inlineCreative) {
     AdLinear* source = LinearOf(wrapperCreative);
     AdLinear* target = LinearOf(inlineCreative);
-    if (source == nullptr || target == nullptr) return KA_OK;
-    const AdVideoClicks* u = source->videoClicks;
-    for (AdVideoClicks* v = target->videoClicks; v != nullptr && u != nullptr; v = v->next) {
-        if (u->clickTrackings != nullptr) {
-            ListEnd<AdClick> end = FindEnd(&v->clickTrackings);
-            Attach(end, CopyClickList(u->clickTrackings));
-            v->clickTrackingCount = end.count;
-        }
-        if (u->customClicks != nullptr) {
-            ListEnd<AdClick> end = FindEnd(&v->customClicks);
-            Attach(end, CopyClickList(u->customClicks));
-            v->customClickCount = end.count;
-        }
-    }
-    // The wrapper's click-through is not copied: the InLine's own destination stands.
-    ListEnd<AdTracking> events = FindEnd(&target->trackingEvents);
-    Attach(events, CopyTrackingList(source->trackingEvents));
-    target->trackingCount = events.count;
+    if (source != nullptr && target != nullptr) AppendLinearTracking(target, &source, 1);
     return KA_OK;
+}
+
+void CVASTParser::AppendLinearTracking(AdLinear* target, AdLinear* const* sources, size_t count) {
+    for (AdVideoClicks* v = target->videoClicks; v != nullptr; v = v->next) {
+        ka::ListEnd<AdClick> trackings = ka::FindEnd(&v->clickTrackings);
+        ka::ListEnd<AdClick> customs = ka::FindEnd(&v->customClicks);
+        bool trackingsCopied = false;
+        bool customsCopied = false;
+        for (size_t i = 0; i < count; ++i) {
+            // Only the first VideoClicks of the wrapper creative is read.
+            const AdVideoClicks* u = sources[i]->videoClicks;
+            if (u == nullptr) continue;
+            if (u->clickTrackings != nullptr) {
+                ka::Attach(trackings, CopyClickList(u->clickTrackings));
+                trackingsCopied = true;
+            }
+            if (u->customClicks != nullptr) {
+                ka::Attach(customs, CopyClickList(u->customClicks));
+                customsCopied = true;
+            }
+        }
+        // A count is rewritten only with its list; the click-through is never copied: the
+        // InLine's own destination stands.
+        if (trackingsCopied) v->clickTrackingCount = trackings.count;
+        if (customsCopied) v->customClickCount = customs.count;
+    }
+    ka::ListEnd<AdTracking> events = ka::FindEnd(&target->trackingEvents);
+    for (size_t i = 0; i < count; ++i) {
+        ka::Attach(events, CopyTrackingList(sources[i]->trackingEvents));
+    }
+    target->trackingCount = events.count;
 }
 
 AdImpression* CVASTParser::CopyImpressionList(AdImpression* list) {
@@ -226,7 +180,7 @@ AdImpression* CVASTParser::CopyImpressionList(AdImpression* list) {
     AdImpression** link = &head;
     for (; list != nullptr; list = list->next) {
         AdImpression* copy = new AdImpression();
-        copy->url = CopyString(list->url);
+        copy->url = ka::CopyString(list->url);
         *link = copy;
         link = &copy->next;
     }
@@ -238,8 +192,8 @@ AdClick* CVASTParser::CopyClickList(AdClick* list) {
     AdClick** link = &head;
     for (; list != nullptr; list = list->next) {
         AdClick* copy = new AdClick();
-        copy->id = CopyString(list->id);
-        copy->url = CopyString(list->url);
+        copy->id = ka::CopyString(list->id);
+        copy->url = ka::CopyString(list->url);
         *link = copy;
         link = &copy->next;
     }
@@ -251,10 +205,10 @@ AdTracking* CVASTParser::CopyTrackingList(AdTracking* list) {
     AdTracking** link = &head;
     for (; list != nullptr; list = list->next) {
         AdTracking* copy = new AdTracking();
-        copy->event = CopyString(list->event);
+        copy->event = ka::CopyString(list->event);
         copy->offsetKind = list->offsetKind;
         copy->offset = list->offset;
-        copy->url = CopyString(list->url);
+        copy->url = ka::CopyString(list->url);
         *link = copy;
         link = &copy->next;
     }

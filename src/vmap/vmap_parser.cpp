@@ -7,9 +7,9 @@
 #include "ka/vmap_parser_api.h"
 #include "platform/limits.h"
 #include "vast/vast_parser.h"
+#include "vast/vast_release.h"
 #include "vmap/vmap_values.h"
-#include "xml/element_values.h"
-#include "xml/text_helpers.h"
+#include "xml/text.h"
 
 namespace {
 
@@ -25,6 +25,7 @@ CVMAPParser::CVMAPParser()
       mVastOnly(0),
       mMergeWrappers(1),
       mStopFlag(nullptr),
+      mInlineChain(ka::ChainContext::Start(1, nullptr, nullptr)),
       mBreakTail(),
       mTrackingTail(),
       mBuiltVastOnly(0) {}
@@ -62,14 +63,12 @@ unsigned int CVMAPParser::Process(void* buffer, unsigned int size) {
     if (mVastOnly == 1) {
         mBuiltVastOnly = 1;
         CreateVASTParser();
-        KA_BOOL neverStop = 0;
-        KA_BOOL* stopFlag = mStopFlag != nullptr ? mStopFlag : &neverStop;
-        const unsigned int result =
-            mVastParser->Process(buffer, size, mMergeWrappers != 0 ? 1 : 0, stopFlag);
-        // The parser keeps the flag it was given; the local one is gone once this returns.
-        if (stopFlag == &neverStop) mVastParser->mStopFlag = nullptr;
-        return result;
+        // Without a flag of the caller's the chain's downloads get one that stays false.
+        return mVastParser->Process(buffer, size, mMergeWrappers != 0 ? 1 : 0, mStopFlag);
     }
+    // The VAST elements of one document share a chain, and with it one fetch budget. Their
+    // downloads get no stop flag: the caller's is for VAST-only mode.
+    mInlineChain = ka::ChainContext::Start(mMergeWrappers != 0 ? 1 : 0, nullptr, mWorkPath);
     if (buffer == nullptr || size == 0 || size > static_cast<unsigned int>(INT_MAX)) {
         return KA_ERR_LOAD_FAILED;
     }
@@ -134,18 +133,17 @@ unsigned int CVMAPParser::ReleaseAdInfo() {
         } else {
             // After a VMAP Process the container only repeats the records of the last ad
             // source with inline VAST; they are freed with that source below.
-            mVastParser->mVastAdData = VastAdData();
+            mVastParser->ForgetVastAdData();
         }
     }
     mBuiltVastOnly = 0;
 
     // The breaks are released whatever the current mode: a VAST-only Process builds none, so
     // a list that exists belongs to an earlier VMAP Process and is freed exactly once here.
-    CVASTParser* spare = nullptr;
     AdBreak* adBreak = mAdInfo.adBreaks;
     for (uint32_t i = 0; i < mAdInfo.adBreakCount && adBreak != nullptr; ++i) {
         if (AdSource* source = adBreak->adSource) {
-            ReleaseVastBlock(source->vastAdData, spare);
+            ReleaseVastBlock(source->vastAdData);
             source->vastAdData = nullptr;
             delete[] source->adTagUri;
             delete[] source->reservedText;
@@ -164,7 +162,6 @@ unsigned int CVMAPParser::ReleaseAdInfo() {
         delete adBreak;
         adBreak = next;
     }
-    delete spare;
     mAdInfo.adBreakCount = 0;
     mAdInfo.adBreaks = nullptr;
     mBreakTail.Reset();
@@ -172,16 +169,9 @@ unsigned int CVMAPParser::ReleaseAdInfo() {
     return KA_OK;
 }
 
-void CVMAPParser::ReleaseVastBlock(VastAdData* block, CVASTParser*& spare) {
+void CVMAPParser::ReleaseVastBlock(VastAdData* block) {
     if (block == nullptr) return;
-    // The release uses no parser state; without the owned parser a plain one, never opened,
-    // does the work.
-    CVASTParser* releaser = mVastParser;
-    if (releaser == nullptr) {
-        if (spare == nullptr) spare = new CVASTParser();
-        releaser = spare;
-    }
-    releaser->ReleaseVastAdData(block);
+    ka::ReleaseVastAdData(block);
     delete block;
 }
 
@@ -207,10 +197,9 @@ unsigned int CVMAPParser::LoadVASTAdData(void* node, VastAdData* block) {
     GetChildByName(node, Name("VAST"), &vast);
     if (vast == nullptr) return KA_OK;
     // The container's previous content belongs to the ad source that copied it.
-    mVastParser->mVastAdData = VastAdData();
-    mVastParser->mMergeWrappers = mMergeWrappers != 0 ? 1 : 0;
+    mVastParser->ForgetVastAdData();
     // The document stays this handle's: the VAST parser walks the node without closing it.
-    mVastParser->ParseVASTNode(vast, false, mMergeWrappers != 0);
+    mVastParser->ParseVASTNodeInChain(vast, false, mMergeWrappers != 0, mInlineChain);
     *block = mVastParser->mVastAdData;
     return KA_OK;
 }
@@ -260,21 +249,21 @@ void CVMAPParser::ReadContentUri(void* extensions) {
     void* extension = nullptr;
     GetChildByName(extensions, Name("uo:unicornOnce"), &extension);
     if (extension == nullptr) return;
-    if (ka::CopyAttribute(*this, extension, "contenturi", mContentUri)) unescape_amp(mContentUri);
+    if (CopyAttribute(extension, "contenturi", mContentUri)) unescape_amp(mContentUri);
 }
 
 unsigned int CVMAPParser::ParseAdBreakAttributes(void* node, AdBreak* adBreak) {
     if (node == nullptr || adBreak == nullptr) return KA_OK;
     char* value = nullptr;
     int length = 0;
-    if (ka::ReadAttribute(*this, node, "breakType", &value, length)) {
+    if (ReadAttribute(node, "breakType", &value, length)) {
         adBreak->breakType |= ka::ParseBreakType(value, length);
     }
-    ka::CopyAttribute(*this, node, "breakId", adBreak->breakId);
-    if (ka::ReadAttribute(*this, node, "timeOffset", &value, length)) {
+    CopyAttribute(node, "breakId", adBreak->breakId);
+    if (ReadAttribute(node, "timeOffset", &value, length)) {
         ka::ParseTimeOffset(value, length, &adBreak->timeOffsetType, &adBreak->timeOffset);
     }
-    if (ka::ReadAttribute(*this, node, "repeatAfter", &value, length)) {
+    if (ReadAttribute(node, "repeatAfter", &value, length)) {
         adBreak->repeatAfter = ka::ParseRepeatAfter(value, length);
     }
     return KA_OK;
@@ -301,11 +290,11 @@ unsigned int CVMAPParser::ParseAdSourceAttributes(void* node, AdSource* source) 
     if (node == nullptr || source == nullptr) return KA_OK;
     char* value = nullptr;
     int length = 0;
-    if (ka::ReadAttribute(*this, node, "id", &value, length)) source->id = ka::ParseDecimal(value);
-    if (ka::ReadAttribute(*this, node, "allowMultipleAds", &value, length)) {
+    if (ReadAttribute(node, "id", &value, length)) source->id = ka::ParseDecimal(value);
+    if (ReadAttribute(node, "allowMultipleAds", &value, length)) {
         source->allowMultipleAds = strcmp(value, "true") == 0;
     }
-    if (ka::ReadAttribute(*this, node, "followRedirects", &value, length)) {
+    if (ReadAttribute(node, "followRedirects", &value, length)) {
         source->followRedirects = strcmp(value, "true") == 0;
     }
     return KA_OK;
@@ -341,6 +330,6 @@ unsigned int CVMAPParser::LoadTrackingTag(void* node, void* target, char* name,
 
 unsigned int CVMAPParser::ParseTrackingEvent(void* node, AdBreakTracking* tracking) {
     if (node == nullptr || tracking == nullptr) return KA_OK;
-    ka::CopyAttribute(*this, node, "event", tracking->event);
+    CopyAttribute(node, "event", tracking->event);
     return KA_OK;
 }

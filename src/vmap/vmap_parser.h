@@ -8,7 +8,8 @@
 #include "ka/types.h"
 #include "ka/vast_records.h"
 #include "ka/vmap_records.h"
-#include "xml/list_tail.h"
+#include "vast/chain_context.h"
+#include "xml/record_lists.h"
 #include "xml/xml_document.h"
 
 class CVASTParser;
@@ -75,7 +76,9 @@ private:
     void ReleaseAll();
     void ReadContentUri(void* extensions);
     // Frees the VAST records of an ad source's block, then the block.
-    void ReleaseVastBlock(VastAdData* block, CVASTParser*& releaser);
+    void ReleaseVastBlock(VastAdData* block);
+    // The chain of the VAST elements of the last VMAP Process, started by that Process.
+    ka::ChainContext mInlineChain;
     // The last records appended, so that long lists are filled in linear time.
     ka::ListTail<AdBreak> mBreakTail;
     ka::ListTail<AdBreakTracking> mTrackingTail;

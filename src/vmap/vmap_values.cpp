@@ -1,18 +1,13 @@
 #include "vmap/vmap_values.h"
 
-#include <climits>
 #include <cstring>
 
 #include "ka/vmap_records.h"
-#include "xml/text_helpers.h"
+#include "xml/text.h"
 
 namespace ka {
 
 namespace {
-
-bool IsSpace(char c) {
-    return c == ' ' || c == '\t' || c == '\n' || c == '\v' || c == '\f' || c == '\r';
-}
 
 bool IsDigit(char c) { return c >= '0' && c <= '9'; }
 
@@ -60,21 +55,6 @@ bool Equals(const char* value, int length, const char* word) {
 }
 
 }  // namespace
-
-int ParseDecimal(const char* text) {
-    if (text == nullptr) return 0;
-    while (IsSpace(*text)) ++text;
-    bool negative = false;
-    if (*text == '+' || *text == '-') negative = *text++ == '-';
-    long long value = 0;
-    for (; IsDigit(*text); ++text) {
-        value = value * 10 + (*text - '0');
-        if (value > static_cast<long long>(INT_MAX) + 1)
-            value = static_cast<long long>(INT_MAX) + 1;
-    }
-    if (negative) return value > INT_MAX ? INT_MIN : static_cast<int>(-value);
-    return value > INT_MAX ? INT_MAX : static_cast<int>(value);
-}
 
 uint32_t ParseBreakType(const char* value, int length) {
     if (value == nullptr) return 0;

@@ -1,14 +1,11 @@
 // Turning the attribute values of a VMAP document into record fields: break type flags, the
-// kinds of time offset, repeat intervals and decimal numbers.
+// kinds of time offset and repeat intervals. Decimal numbers are read by ParseDecimal
+// ("xml/text.h").
 #pragma once
 
 #include <cstdint>
 
 namespace ka {
-
-// atoi's reading (leading white space, a sign, digits up to the first other character, 0
-// without digits), clamped to the int range instead of overflowing.
-int ParseDecimal(const char* text);
 
 // BREAK_TYPE_* flags for the whole words of value, where any character that is not a letter
 // (ASCII letters and bytes of multi-byte characters) separates words; case-sensitive.

@@ -1,9 +1,11 @@
 #include "xml/xml_document.h"
 
 #include <cstring>
+#include <new>
 
 #include "ka/result_codes.h"
 #include "platform/bounded_string.h"
+#include "xml/text.h"
 
 namespace {
 
@@ -102,4 +104,63 @@ unsigned int CXMLDocument::GetParam(unsigned int id, void* value) {
 unsigned int CXMLDocument::Reserved12(char* text, void* node, int& a, int& b) {
     if (mXMLHandle == nullptr || mXMLAPI.Reserved12 == nullptr) return KA_ERR_MODULE_NOT_LOADED;
     return mXMLAPI.Reserved12(mXMLHandle, text, node, &a, &b);
+}
+
+// Element access shared by both parsers' handlers.
+
+bool CXMLDocument::ReadElementText(void* node, char*& field, TextForm form) {
+    char* text = nullptr;
+    int length = 0;
+    GetTagValue(node, &text, length);
+    // The module's strings are NUL-terminated and its length says the same; neither the test for
+    // text nor the copy depends on that length.
+    if (text == nullptr || text[0] == '\0') return false;
+
+    delete[] field;
+    field = nullptr;
+
+    const size_t size = strlen(text);
+    const bool isCData = ka::IsCDataSection(text);
+    size_t begin = 0;
+    size_t count = size;
+    if (isCData) ka::CDataContent(text, size, &begin, &count);
+    char* copy = new (std::nothrow) char[count + 1];
+    if (copy == nullptr) return false;
+    memcpy(copy, text + begin, count);
+    copy[count] = '\0';
+    field = copy;
+    // Most texts hold no '&' at all; they are not searched for "&amp;" a second time.
+    if (!isCData && form == TextForm::kDecoded && memchr(copy, '&', count) != nullptr) {
+        unescape_amp(field);
+    }
+    return true;
+}
+
+void CXMLDocument::GetElementText(void* node, char*& field) {
+    ReadElementText(node, field, TextForm::kDecoded);
+}
+
+unsigned int CXMLDocument::IsElementCData(void* node, char** text, int& length) {
+    length = 0;
+    if (text == nullptr) return KA_ERR_LOAD_FAILED;
+    *text = nullptr;
+    GetTagValue(node, text, length);
+    return *text != nullptr && ka::IsCDataSection(*text) ? KA_OK : KA_ERR_LOAD_FAILED;
+}
+
+bool CXMLDocument::ReadAttribute(void* node, const char* name, char** value, int& length) {
+    *value = nullptr;
+    length = 0;
+    // The module's lookups take mutable names but never write to them.
+    GetAttributeValue(node, const_cast<char*>(name), value, length);
+    return *value != nullptr && length >= 1;
+}
+
+bool CXMLDocument::CopyAttribute(void* node, const char* name, char*& field) {
+    char* value = nullptr;
+    int length = 0;
+    if (!ReadAttribute(node, name, &value, length)) return false;
+    delete[] field;
+    field = ka::CopyText(value, static_cast<size_t>(length));
+    return true;
 }

@@ -4,7 +4,7 @@
 #pragma once
 
 #include "platform/lib_loader.h"
-#include "xml/xml_parser_api.h"
+#include "xml_parser_api.h"
 
 class CXMLDocument : public CLibLoader {
 public:
@@ -30,11 +30,27 @@ public:
     unsigned int GetParam(unsigned int id, void* value);
     unsigned int Reserved12(char* text, void* node, int& a, int& b);
 
-    // Element text for a record field: CDATA unwrapped and trimmed, otherwise "&amp;" decoded.
-    // Replaces (and frees) the field's string only when the element has text.
+    // How ReadElementText stores a text that is not a CDATA section.
+    enum class TextForm {
+        kDecoded,  // each "&amp;" turned into "&"
+        kRaw,      // entities kept as written
+    };
+
+    // Element text for a record field: a complete CDATA section unwrapped and trimmed (its
+    // content is never decoded; one that does not close is stored whole), any other text in the
+    // given form. Replaces (and frees) the field's string only when the element has at least
+    // one character of text; true when it did.
+    bool ReadElementText(void* node, char*& field, TextForm form);
+    // ReadElementText in the decoded form: what most record fields hold.
     void GetElementText(void* node, char*& field);
     // 0 when the element's text is a CDATA section, 0x91001000 otherwise.
     unsigned int IsElementCData(void* node, char** text, int& length);
+
+    // Looks up an attribute: true when it exists with at least one character.
+    bool ReadAttribute(void* node, const char* name, char** value, int& length);
+    // Replaces field with a copy of the attribute's raw value when it is present; true when it
+    // did.
+    bool CopyAttribute(void* node, const char* name, char*& field);
 
     void* mXMLHandle;
     XMLParserAPI mXMLAPI;

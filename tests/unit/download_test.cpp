@@ -15,7 +15,7 @@
 #include "ka/result_codes.h"
 #include "loopback.h"
 #include "net/download.h"
-#include "net/source_io_api.h"
+#include "source_io_api.h"
 
 namespace {
 

@@ -13,7 +13,7 @@
 #include <string>
 #include <thread>
 
-#include "net/source_io_api.h"
+#include "source_io_api.h"
 
 namespace loopback {
 

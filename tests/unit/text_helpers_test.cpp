@@ -1,5 +1,5 @@
 // CDATA unwrapping, "&amp;" decoding and clock times; the cases are in tests/data/text_cases.txt.
-#include "xml/text_helpers.h"
+#include "xml/text.h"
 
 #include <gtest/gtest.h>
 

@@ -15,16 +15,12 @@
 #include "ka/vmap_parser_api.h"
 #include "printer.h"
 #include "result_text.h"
+#include "source_io_api.h"
 
 namespace {
 
 // Bigger documents are no ad playlists; refusing them keeps the size within 32 bits.
 constexpr size_t kMaxDocumentSize = 256u << 20;
-
-// Module-wide settings of the source-IO module (SetParam on a null handle): a non-zero
-// uint32_t lets it read local files, and the folder against which relative paths are read.
-constexpr uint32_t kSourceAllowFiles = 0x7a000003;
-constexpr uint32_t kSourceFileBaseDir = 0x7a000004;
 
 struct Options {
     bool vastOnly = false;
@@ -155,8 +151,8 @@ public:
     // without a network.
     void AllowFilesBelow(const std::string& dir) {
         uint32_t one = 1;
-        mApi.SetParam(nullptr, kSourceAllowFiles, &one);
-        mApi.SetParam(nullptr, kSourceFileBaseDir, const_cast<char*>(dir.c_str()));
+        mApi.SetParam(nullptr, ka::kSioAllowFiles, &one);
+        mApi.SetParam(nullptr, ka::kSioFileBaseDir, const_cast<char*>(dir.c_str()));
     }
 
 private:
@@ -181,10 +177,9 @@ std::string DocumentDir(const std::string& document) {
 // Fetches url through the library's DownloadToBuffer; false with a message on failure.
 bool FetchDocument(void* library, SourceModule& module, const std::string& url,
                    std::vector<char>& data) {
-    typedef uint32_t (*DownloadFn)(SourceIOApi*, void*, void*, void*, void*, DownloadRecord*,
-                                   uint8_t**, uint32_t*, uint32_t*, KA_BOOL*, KA_BOOL, void*,
-                                   char*);
-    auto download = reinterpret_cast<DownloadFn>(dlsym(library, "DownloadToBuffer"));
+    // Resolved at run time like the rest of the library, with the public declaration's type.
+    auto download =
+        reinterpret_cast<decltype(&DownloadToBuffer)>(dlsym(library, "DownloadToBuffer"));
     if (download == nullptr) {
         fprintf(stderr, "kavmap: the library has no DownloadToBuffer\n");
         return false;

@@ -3,7 +3,7 @@
 
 #include <stdint.h>
 
-#include "xml/xml_parser_api.h"
+#include "xml_parser_api.h"
 
 struct FakeXmlState {
     int initCalls;

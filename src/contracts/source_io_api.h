@@ -1,5 +1,6 @@
-// What the library and the stand-in source-IO module agree on beyond the table in
-// "ka/download.h": parameter ids, their value records, and the codes GetSourceSize answers.
+// What the library, the stand-in source-IO module and the command-line host agree on beyond the
+// table in "ka/download.h": parameter ids, their value records, and the codes GetSourceSize
+// answers.
 #pragma once
 
 #include <cstdint>

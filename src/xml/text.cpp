@@ -1,37 +1,36 @@
-#include "xml/text_helpers.h"
+#include "xml/text.h"
 
+#include <climits>
 #include <cstring>
 
 #include "ka/result_codes.h"
+#include "xml_parser_api.h"
 
 namespace {
-
-constexpr char kCDataOpen[] = "![CDATA[";
-constexpr size_t kCDataOpenLength = sizeof(kCDataOpen) - 1;
-constexpr char kCDataClose[] = "]]";
-constexpr size_t kCDataCloseLength = sizeof(kCDataClose) - 1;
 
 constexpr char kAmpEntity[] = "&amp;";
 constexpr size_t kAmpEntityLength = sizeof(kAmpEntity) - 1;
 
-// Bytes at or above 0x80 are never white space, whatever the locale says.
-bool IsSpace(char c) {
-    return c == ' ' || c == '\t' || c == '\n' || c == '\v' || c == '\f' || c == '\r';
-}
+// Past this a decimal magnitude stops growing: it already clamps to either end of int.
+constexpr long long kDecimalCeiling = static_cast<long long>(INT_MAX) + 1;
 
 }  // namespace
 
 namespace ka {
 
+bool IsCDataSection(const char* text) {
+    return text[0] == kXmlCDataOpen[0] && strncmp(text, kXmlCDataOpen, kXmlCDataOpenLength) == 0;
+}
+
 bool CDataContent(const char* text, size_t length, size_t* begin, size_t* count) {
     // The opening ends in '[' and the closing holds none, so the two never overlap.
-    if (length < kCDataOpenLength + kCDataCloseLength ||
-        memcmp(text, kCDataOpen, kCDataOpenLength) != 0 ||
-        memcmp(text + length - kCDataCloseLength, kCDataClose, kCDataCloseLength) != 0) {
+    if (length < kXmlCDataOpenLength + kXmlCDataCloseLength ||
+        memcmp(text, kXmlCDataOpen, kXmlCDataOpenLength) != 0 ||
+        memcmp(text + length - kXmlCDataCloseLength, kXmlCDataClose, kXmlCDataCloseLength) != 0) {
         return false;
     }
-    size_t first = kCDataOpenLength;
-    size_t end = length - kCDataCloseLength;
+    size_t first = kXmlCDataOpenLength;
+    size_t end = length - kXmlCDataCloseLength;
     while (first < end && IsSpace(text[first])) ++first;
     while (end > first && IsSpace(text[end - 1])) --end;
     *begin = first;
@@ -53,6 +52,7 @@ bool ScanDecimal(const char** cursor, int width, long long* value) {
     int digits = 0;
     while (left > 0 && *p >= '0' && *p <= '9') {
         result = result * 10 + (*p - '0');
+        if (result > kDecimalCeiling) result = kDecimalCeiling;
         ++p;
         --left;
         ++digits;
@@ -61,6 +61,26 @@ bool ScanDecimal(const char** cursor, int width, long long* value) {
     *value = negative ? -result : result;
     *cursor = p;
     return true;
+}
+
+int ParseDecimal(const char* text) {
+    if (text == nullptr) return 0;
+    long long value = 0;
+    if (!ScanDecimal(&text, INT_MAX, &value)) return 0;
+    if (value > INT_MAX) return INT_MAX;
+    if (value < INT_MIN) return INT_MIN;
+    return static_cast<int>(value);
+}
+
+char* CopyText(const char* text, size_t length) {
+    char* copy = new char[length + 1];
+    memcpy(copy, text, length);
+    copy[length] = '\0';
+    return copy;
+}
+
+char* CopyString(const char* text) {
+    return text == nullptr ? nullptr : CopyText(text, strlen(text));
 }
 
 }  // namespace ka

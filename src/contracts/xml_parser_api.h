@@ -1,7 +1,10 @@
-// The XML parser module's table of operations, as its entry "kaXMLGetParserAPI" fills it.
-// Shared by the library and the stand-in module. Every operation returns 0 on success; nodes
-// are opaque; strings point into memory the module owns until the next load or Uninit.
+// The XML parser module's table of operations, as its entry "kaXMLGetParserAPI" fills it, and
+// the form of the texts it hands out. Shared by the library and the stand-in module. Every
+// operation returns 0 on success; nodes are opaque; strings point into memory the module owns
+// until the next load or Uninit.
 #pragma once
+
+#include <cstddef>
 
 struct XMLInitData {
     void* reserved0;  // always null
@@ -41,3 +44,19 @@ struct XMLParserAPI {
 };
 
 typedef int (*KaXMLGetParserAPIFn)(XMLParserAPI* api);
+
+namespace ka {
+
+// An element whose text is a CDATA section reads as kXmlCDataOpen + content + kXmlCDataClose.
+constexpr char kXmlCDataOpen[] = "![CDATA[";
+constexpr size_t kXmlCDataOpenLength = sizeof(kXmlCDataOpen) - 1;
+constexpr char kXmlCDataClose[] = "]]";
+constexpr size_t kXmlCDataCloseLength = sizeof(kXmlCDataClose) - 1;
+
+// The white space the module trims from element texts and the library from CDATA content: the
+// six characters of C's "C" locale. Bytes at or above 0x80 are never white space.
+inline bool IsXmlSpace(char c) {
+    return c == ' ' || c == '\t' || c == '\n' || c == '\v' || c == '\f' || c == '\r';
+}
+
+}  // namespace ka

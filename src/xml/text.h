@@ -1,0 +1,53 @@
+// Character-level helpers of both parsers: white space, tag names, CDATA sections, "&amp;"
+// decoding, decimal numbers, "hh:mm:ss.mmm" clock times and string copies. Nothing here knows
+// the XML module; reading an element's text or attributes is CXMLDocument's.
+#pragma once
+
+#include <cstddef>
+#include <cstring>
+#include <string>
+
+#include "xml_parser_api.h"
+
+// Copies the trimmed content of a raw "![CDATA[...]]" section into dst (size bytes, always
+// terminated); 0 when the whole content fit, 0x91001000 otherwise or for a null source.
+unsigned int parse_cdata(char* dst, const char* src, int size);
+// Turns every "&amp;" into "&" in place, each occurrence once; always 0.
+int unescape_amp(char* text);
+// Milliseconds of a clock time "%02d:%02d:%02d.%03d"; fields not reached count 0.
+unsigned int string2time(const char* text, int length);
+
+namespace ka {
+
+// The six white-space characters of C's "C" locale, the same the XML module trims; bytes at or
+// above 0x80 are never white space, whatever the locale says.
+inline bool IsSpace(char c) { return IsXmlSpace(c); }
+
+// Exact, case-sensitive comparison of a tag name of the given length with a literal. Inline, so
+// that the literal's length is known where it is called: every handler tries several names.
+inline bool NameIs(const char* name, unsigned int length, const char* literal) {
+    if (name == nullptr) return false;
+    const size_t n = std::char_traits<char>::length(literal);
+    return length == n && memcmp(name, literal, n) == 0;
+}
+
+// True when text begins with the "![CDATA[" opening, whether or not the section closes.
+bool IsCDataSection(const char* text);
+// Where the trimmed content of a complete raw "![CDATA[...]]" section of length bytes begins and
+// how long it is; false (outputs untouched) when text is not such a section.
+bool CDataContent(const char* text, size_t length, size_t* begin, size_t* count);
+
+// One "%Nd" conversion of sscanf with width N at *cursor: white space skipped, a sign and then
+// digits, N characters at most after the white space. The magnitude stops growing past
+// INT_MAX + 1, so any width is safe. Advances *cursor and writes *value only when it succeeds.
+bool ScanDecimal(const char** cursor, int width, long long* value);
+// atoi's reading (leading white space, a sign, digits up to the first other character, 0
+// without digits), clamped to the int range instead of overflowing.
+int ParseDecimal(const char* text);
+
+// A new[] copy of the first length characters of text, terminated.
+char* CopyText(const char* text, size_t length);
+// A new[] copy of a terminated string; null for null.
+char* CopyString(const char* text);
+
+}  // namespace ka
