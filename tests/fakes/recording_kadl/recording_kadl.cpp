@@ -1,53 +1,42 @@
-// Recording stand-in for libkadl.so: every call is logged as "load:NAME", "symbol:NAME" or
-// "free"; a load succeeds only for names the test accepted, a symbol only when provided.
-#include <cstring>
+// libkadl.so that logs each call as "load:NAME ", "symbol:NAME " or "free "; a load or a symbol
+// succeeds only for a name the test accepted.
 #include <string>
-#include <vector>
 
 #define FAKE_API extern "C" __attribute__((visibility("default")))
 
 namespace {
-std::vector<std::string> gLog;
-std::vector<std::string> gAccepted;
-std::vector<std::string> gSymbols;
-int gModule;  // the address handed out as every module's handle
+std::string gLog;
+std::string gAccepted = "\n";  // each name between newlines
+int gModule;                   // every module's handle
 
 int EntryFunction(void*) { return 0; }
 
-bool Contains(const std::vector<std::string>& list, const char* name) {
-    for (const std::string& item : list) {
-        if (name != nullptr && item == name) return true;
-    }
-    return false;
+bool Accepted(const char* name) {
+    return gAccepted.find("\n" + std::string(name) + "\n") != std::string::npos;
 }
 }  // namespace
 
+FAKE_API const char* fake_kadl_log() { return gLog.c_str(); }
 FAKE_API void fake_kadl_reset() {
     gLog.clear();
-    gAccepted.clear();
-    gSymbols.clear();
+    gAccepted = "\n";
 }
-FAKE_API void fake_kadl_accept(const char* name) { gAccepted.emplace_back(name); }
-FAKE_API void fake_kadl_provide_symbol(const char* name) { gSymbols.emplace_back(name); }
-FAKE_API int fake_kadl_log_size() { return static_cast<int>(gLog.size()); }
-FAKE_API const char* fake_kadl_log_entry(int i) { return gLog[i].c_str(); }
-FAKE_API void* fake_kadl_module_handle() { return &gModule; }
-FAKE_API void* fake_kadl_entry() { return reinterpret_cast<void*>(&EntryFunction); }
+FAKE_API void fake_kadl_accept(const char* name) { gAccepted += std::string(name) + "\n"; }
 
 FAKE_API void* kaLoadLibrary(const char* name, int flags) {
-    gLog.push_back("load:" + std::string(name) + (flags == 2 ? "" : " (bad flags)"));
-    return Contains(gAccepted, name) ? &gModule : nullptr;
+    gLog += "load:" + std::string(name) + (flags == 2 ? " " : "(bad flags) ");
+    return Accepted(name) ? &gModule : nullptr;
 }
 
 FAKE_API void* kaGetAddressSymbol(void* handle, const char* symbol) {
-    gLog.push_back("symbol:" + std::string(symbol));
-    if (handle != &gModule || !Contains(gSymbols, symbol)) return nullptr;
-    return reinterpret_cast<void*>(&EntryFunction);
+    gLog += "symbol:" + std::string(symbol) + " ";
+    return handle == &gModule && Accepted(symbol) ? reinterpret_cast<void*>(&EntryFunction)
+                                                  : nullptr;
 }
 
 #ifndef KA_FAKE_WITHOUT_FREE
 FAKE_API int kaFreeLibrary(void* handle) {
-    gLog.push_back(handle == &gModule ? "free" : "free (bad handle)");
+    gLog += handle == &gModule ? "free " : "free(bad handle) ";
     return 0;
 }
 #endif
