@@ -1,18 +1,14 @@
 // The command-line host run as a user runs it: exit status, standard output and the one-line
 // failure message.
-#include <arpa/inet.h>
 #include <gtest/gtest.h>
-#include <netinet/in.h>
-#include <poll.h>
 #include <stdlib.h>
-#include <sys/socket.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <string>
-#include <thread>
 
 #include "api_support.h"
+#include "loopback.h"
 
 namespace {
 
@@ -145,45 +141,15 @@ TEST(Kavmap, FailuresExitNonZeroWithOneLine) {
     }
 }
 
-// One response from a loopback port; the local file the fetched wrapper names must not be read.
+// The fetched wrapper names a local file, which must not be read: file access is for local
+// documents only.
 TEST(Kavmap, UrlDocumentIsFetchedWithoutFileAccess) {
-    const std::string body = katest::WrapperTo();
-    const std::string response =
-        "HTTP/1.1 200 OK\r\nContent-Length: " + std::to_string(body.size()) +
-        "\r\nConnection: close\r\n\r\n" + body;
-    const int listener = socket(AF_INET, SOCK_STREAM, 0);
-    sockaddr_in address = {};
-    address.sin_family = AF_INET;
-    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-    socklen_t length = sizeof(address);
-    ASSERT_EQ(bind(listener, reinterpret_cast<sockaddr*>(&address), length), 0);
-    ASSERT_EQ(listen(listener, 1), 0);
-    ASSERT_EQ(getsockname(listener, reinterpret_cast<sockaddr*>(&address), &length), 0);
-    std::thread server([listener, &response] {
-        pollfd waiting = {listener, POLLIN, 0};
-        const int client = poll(&waiting, 1, 10000) == 1 ? accept(listener, nullptr, nullptr) : -1;
-        if (client < 0) return;
-        // The whole request is read first: closing on unread bytes would reset the connection.
-        std::string request;
-        char chunk[1024];
-        pollfd readable = {client, POLLIN, 0};
-        ssize_t n = 1;
-        while (n > 0 && request.find("\r\n\r\n") == std::string::npos &&
-               poll(&readable, 1, 5000) == 1) {
-            n = read(client, chunk, sizeof(chunk));
-            if (n > 0) request.append(chunk, static_cast<size_t>(n));
-        }
-        EXPECT_EQ(send(client, response.data(), response.size(), MSG_NOSIGNAL),
-                  static_cast<ssize_t>(response.size()));
-        close(client);
-    });
-    const RunResult run =
-        RunKavmap("--vast http://127.0.0.1:" + std::to_string(ntohs(address.sin_port)) + "/v.xml");
-    server.join();
-    close(listener);
+    loopback::Server server;
+    const RunResult run = RunKavmap("--vast " + server.Put("v.xml", katest::WrapperTo()));
     EXPECT_EQ(run.status, 0) << run.err;
     EXPECT_NE(run.out.find("ad 1: id outer, sequence 0, Wrapper\n"), std::string::npos) << run.out;
     EXPECT_EQ(run.out.find("Wrapped Spot"), std::string::npos);
+    EXPECT_EQ(server.Requests(), 1);
 }
 
 }  // namespace

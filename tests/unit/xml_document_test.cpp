@@ -1,20 +1,16 @@
-// CXMLDocument over the real XML parser module (loaded from the modules folder through
-// libkadl.so), and over a recording module that shows what the document hands on.
+// CXMLDocument over the real XML parser module, loaded from the modules folder through
+// libkadl.so: what the parsers rely on of it, and what it answers without a module.
 #include "xml/xml_document.h"
 
-#include <dlfcn.h>
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <cstring>
 #include <fstream>
-#include <functional>
 #include <memory>
 #include <sstream>
 #include <string>
 #include <vector>
 
-#include "../fakes/recording_xmlparser/recording_xmlparser.h"
 #include "ka/result_codes.h"
 #include "platform/limits.h"
 
@@ -25,81 +21,17 @@ using Strings = std::vector<std::string>;
 // SetWorkPath keeps the pointer, so the paths live as long as the program.
 char gModulesDir[] = KA_MODULES_DIR;
 char gMissingDir[] = "/nonexistent-ka-modules/";
-char gRecordingDir[] = KA_FAKES_DIR "recording_xmlparser/";
-char gNoEntryDir[] = KA_FAKES_DIR "xmlparser_without_entry/";
 
 // Outputs start as these, so a call that must not touch them can be seen to.
 void* const kSentinel = reinterpret_cast<void*>(0x1234);
 char gUntouched[] = "untouched";
 constexpr int kLengthSentinel = 77;
 const char* const kNull = "<null>";
-char gText[] = "text";
-
-int FilledSlots(const XMLParserAPI& api) {
-    void* slots[13];
-    static_assert(sizeof(api) == sizeof(slots), "thirteen slots");
-    memcpy(slots, &api, sizeof(slots));
-    return static_cast<int>(13 - std::count(slots, slots + 13, nullptr));
-}
 
 // A string output as the tests compare it; the length must agree with the string.
 std::string Shown(const char* text, int length) {
     EXPECT_EQ(length, text == nullptr ? 0 : static_cast<int>(strlen(text)));
     return text == nullptr ? kNull : text;
-}
-
-intptr_t Arg(const void* p) { return reinterpret_cast<intptr_t>(p); }
-
-struct Outputs {
-    void* node = kSentinel;
-    char* string = gUntouched;
-    char* other = gUntouched;
-    int a = kLengthSentinel;
-    int b = kLengthSentinel;
-    bool Untouched() const {
-        return node == kSentinel && string == gUntouched && other == gUntouched &&
-               a == kLengthSentinel && b == kLengthSentinel;
-    }
-};
-
-// One call of each forwarder (slots 2 to 12) and the arguments the module must see after the
-// handle.
-struct Forwarder {
-    int slot;
-    std::function<unsigned int(CXMLDocument&)> call;
-    std::vector<intptr_t> args;
-};
-
-std::vector<Forwarder> Forwarders(Outputs& o) {
-    const intptr_t n = Arg(kSentinel);
-    using D = CXMLDocument&;
-    return {
-        {2, [](D d) { return d.LoadXML(gText, 4, ka::kXmlLoadMode); }, {Arg(gText), 4, 160}},
-        {3, [&o](D d) { return d.GetFirstChild(kSentinel, &o.node); }, {n, Arg(&o.node)}},
-        {4, [&o](D d) { return d.GetNextSibling(kSentinel, &o.node); }, {n, Arg(&o.node)}},
-        {5,
-         [&o](D d) { return d.GetChildByName(kSentinel, gText, &o.node); },
-         {n, Arg(gText), Arg(&o.node)}},
-        {6,
-         [&o](D d) { return d.GetAttributeValue(kSentinel, gText, &o.string, o.a); },
-         {n, Arg(gText), Arg(&o.string), Arg(&o.a)}},
-        {7,
-         [&o](D d) {
-             return d.GetNextAttribute(kSentinel, &o.node, gText, &o.string, o.a, &o.other, o.b);
-         },
-         {n, Arg(&o.node), Arg(gText), Arg(&o.string), Arg(&o.a), Arg(&o.other), Arg(&o.b)}},
-        {8,
-         [&o](D d) { return d.GetTagValue(kSentinel, &o.string, o.a); },
-         {n, Arg(&o.string), Arg(&o.a)}},
-        {9,
-         [&o](D d) { return d.GetTagName(kSentinel, &o.string, o.b); },
-         {n, Arg(&o.string), Arg(&o.b)}},
-        {10, [](D d) { return d.SetParam(0x44u, gText); }, {0x44, Arg(gText)}},
-        {11, [&o](D d) { return d.GetParam(0x45u, &o.node); }, {0x45, Arg(&o.node)}},
-        {12,
-         [&o](D d) { return d.Reserved12(gText, kSentinel, o.a, o.b); },
-         {Arg(gText), n, Arg(&o.a), Arg(&o.b)}},
-    };
 }
 
 class XmlDocumentTest : public ::testing::Test {
@@ -179,38 +111,28 @@ protected:
     int mStartObjects = 0;
 };
 
-TEST_F(XmlDocumentTest, WithoutModuleEveryOperationAnswersNotLoaded) {
-    struct {
-        const char* label;
-        char* workPath;  // null: InitXMLParser is never called
-        bool release;    // Uninit after a successful Init
-    } const cases[] = {{"never initialised", nullptr, false},
-                       {"module missing", gMissingDir, false},
-                       {"entry missing", gNoEntryDir, false},
-                       {"released", gModulesDir, true}};
-    for (const auto& c : cases) {
-        SCOPED_TRACE(c.label);
-        CXMLDocument& document = NewDocument(c.workPath);
-        if (c.workPath != nullptr) {
-            EXPECT_EQ(document.InitXMLParser(), c.release ? KA_OK : KA_ERR_MODULE_NOT_LOADED);
-        }
-        if (c.release) {
-            EXPECT_EQ(document.UninitXMLParser(), KA_OK);
+TEST_F(XmlDocumentTest, WithoutModuleOperationsAnswerNotLoaded) {
+    for (char* workPath : {static_cast<char*>(nullptr), gMissingDir, gModulesDir}) {
+        SCOPED_TRACE(workPath != nullptr ? workPath : "never initialised");
+        CXMLDocument& document = NewDocument(workPath);
+        if (workPath != nullptr) {
+            EXPECT_EQ(document.InitXMLParser(),
+                      workPath == gModulesDir ? KA_OK : KA_ERR_MODULE_NOT_LOADED);
+            EXPECT_EQ(document.UninitXMLParser(), KA_OK);  // the released module, last
         }
         EXPECT_EQ(document.mXMLHandle, nullptr);
-        EXPECT_EQ(FilledSlots(document.mXMLAPI), 0);
-
-        Outputs outputs;
-        for (const Forwarder& f : Forwarders(outputs)) {
-            SCOPED_TRACE(f.slot);
-            EXPECT_EQ(f.call(document), KA_ERR_MODULE_NOT_LOADED);
-            EXPECT_TRUE(outputs.Untouched());
-        }
-        // A module whose entry was missing stays loaded until Uninit releases it.
-        EXPECT_EQ(document.mLibHandle != nullptr, c.workPath == gNoEntryDir);
-        EXPECT_EQ(document.UninitXMLParser(), KA_OK);
-        EXPECT_EQ(document.UninitXMLParser(), KA_OK);
         EXPECT_EQ(document.mLibHandle, nullptr);
+        void* node = kSentinel;
+        char* text = gUntouched;
+        int length = kLengthSentinel;
+        char name[] = "a";
+        EXPECT_EQ(document.LoadXML(name, 1, ka::kXmlLoadMode), KA_ERR_MODULE_NOT_LOADED);
+        EXPECT_EQ(document.GetFirstChild(nullptr, &node), KA_ERR_MODULE_NOT_LOADED);
+        EXPECT_EQ(document.GetChildByName(nullptr, name, &node), KA_ERR_MODULE_NOT_LOADED);
+        EXPECT_EQ(document.GetTagValue(nullptr, &text, length), KA_ERR_MODULE_NOT_LOADED);
+        EXPECT_EQ(document.GetAttributeValue(nullptr, name, &text, length),
+                  KA_ERR_MODULE_NOT_LOADED);
+        EXPECT_TRUE(node == kSentinel && text == gUntouched && length == kLengthSentinel);
         // Init works again after any of these.
         document.SetWorkPath(gModulesDir);
         ASSERT_EQ(document.InitXMLParser(), KA_OK);
@@ -334,58 +256,5 @@ TEST_F(XmlDocumentTest, ElementTexts) {
                   c.raw);
     }
 }
-
-class XmlDocumentCallsTest : public XmlDocumentTest {
-protected:
-    void SetUp() override {
-        XmlDocumentTest::SetUp();
-        // Held open by the test, so the document loads this very instance and its record
-        // outlives the document's own unloading.
-        mFake = dlopen(KA_FAKES_DIR "recording_xmlparser/libkaXMLParser.so", RTLD_NOW);
-        ASSERT_NE(mFake, nullptr) << dlerror();
-        auto state = reinterpret_cast<FakeXmlStateFn>(dlsym(mFake, "fake_xml_state"));
-        ASSERT_NE(state, nullptr);
-        mState = state();
-        *mState = FakeXmlState{};
-    }
-    void TearDown() override {
-        XmlDocumentTest::TearDown();
-        if (mFake != nullptr) dlclose(mFake);
-    }
-
-    void* mFake = nullptr;
-    FakeXmlState* mState = nullptr;
-};
-
-TEST_F(XmlDocumentCallsTest, InitAndUninitCallTheModuleOncePerHandle) {
-    CXMLDocument& document = NewDocument(gRecordingDir);
-    ASSERT_EQ(document.InitXMLParser(), KA_OK);
-    EXPECT_EQ(mState->lastInit.reserved0, nullptr);
-    EXPECT_EQ(mState->lastInit.reserved1, nullptr);
-    EXPECT_EQ(mState->lastInit.owner, static_cast<void*>(&document));
-    void* first = document.mXMLHandle;
-    // A second Init closes the first handle once.
-    ASSERT_EQ(document.InitXMLParser(), KA_OK);
-    EXPECT_EQ(mState->initCalls, 2);
-    EXPECT_EQ(mState->uninitCalls, 1);
-    EXPECT_EQ(mState->lastUninitHandle, first);
-    EXPECT_NE(document.mXMLHandle, first);
-    void* second = document.mXMLHandle;
-    EXPECT_EQ(document.UninitXMLParser(), KA_OK);
-    EXPECT_EQ(document.UninitXMLParser(), KA_OK);
-    EXPECT_EQ(mState->uninitCalls, 2);
-    EXPECT_EQ(mState->lastUninitHandle, second);
-
-    // A failed Init returns its code and keeps what it wrote: the destructor closes that handle.
-    mState->initResult = 0x1234u;
-    mState->initHandle = kSentinel;
-    EXPECT_EQ(document.InitXMLParser(), 0x1234u);
-    EXPECT_EQ(document.mXMLHandle, kSentinel);
-    EXPECT_EQ(FilledSlots(document.mXMLAPI), 13);
-    mDocuments.clear();
-    EXPECT_EQ(mState->uninitCalls, 3);
-    EXPECT_EQ(mState->lastUninitHandle, kSentinel);
-}
-
 
 }  // namespace

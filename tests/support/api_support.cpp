@@ -101,12 +101,6 @@ AdInfo* Handle::Info() const {
     return info;
 }
 
-const char* Handle::ContentUri() const {
-    char* uri = nullptr;
-    Api().GetParam(mHandle, KA_PID_VMAP_CONTENT_URI, &uri);
-    return uri;
-}
-
 void Handle::SetFlag(uint32_t id, bool on) {
     EXPECT_EQ(Api().SetParam(mHandle, id, on ? kUntouched : nullptr), KA_OK);
 }
@@ -115,13 +109,6 @@ VastAdData* Handle::Container() const {
     VastAdData* data = static_cast<VastAdData*>(kUntouched);
     EXPECT_EQ(Api().GetVastAdData(mHandle, &data), KA_OK);
     return data;
-}
-
-AdBreak* BreakById(const AdInfo* info, const char* id) {
-    for (AdBreak* b = info != nullptr ? info->adBreaks : nullptr; b != nullptr; b = b->next) {
-        if (b->breakId != nullptr && strcmp(b->breakId, id) == 0) return b;
-    }
-    return nullptr;
 }
 
 std::string WrapperTo(const std::string& uri) {

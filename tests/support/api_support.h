@@ -39,7 +39,6 @@ public:
     uint32_t Process(std::vector<char> document);
     uint32_t Process(const std::string& text);
     AdInfo* Info() const;
-    const char* ContentUri() const;
     // SetParam with a non-null value for true.
     void SetFlag(uint32_t id, bool on);
     // What GetVastAdData lends, or kUntouched when it writes nothing.
@@ -51,15 +50,8 @@ private:
     uint32_t mOpenResult;
 };
 
-AdBreak* BreakById(const AdInfo* info, const char* id);  // the first match, or null
 // A VAST document of one Wrapper ad "outer" naming uri; by default a file in the test data.
 std::string WrapperTo(const std::string& uri = std::string(KA_TEST_DATA_DIR) +
                                                "documents/vast/wrapped_inline.wrapped.xml");
-template <typename Record>
-size_t Length(const Record* first) {
-    size_t n = 0;
-    for (; first != nullptr; first = first->next) ++n;
-    return n;
-}
 
 }  // namespace katest
