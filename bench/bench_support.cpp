@@ -1,13 +1,13 @@
 #include "bench_support.h"
 
-#include "source_io_api.h"
-
 #include <dlfcn.h>
 
 #include <cstdio>
 #include <cstdlib>
 #include <fstream>
 #include <sstream>
+
+#include "source_io_api.h"
 
 namespace bench {
 namespace {
@@ -26,7 +26,8 @@ std::string ReadFile(const std::string& path) {
 }
 
 void ReplaceAll(std::string& text, const std::string& from, const std::string& to) {
-    for (size_t at = text.find(from); at != std::string::npos; at = text.find(from, at + to.size())) {
+    for (size_t at = text.find(from); at != std::string::npos;
+         at = text.find(from, at + to.size())) {
         text.replace(at, from.size(), to);
     }
 }
@@ -50,22 +51,30 @@ std::string MakePlaylist(const std::string& vastDocument, int breaks) {
         std::string copy = ad;
         ReplaceAll(copy, "bench-inline-1", id);
         ReplaceAll(copy, "winter", id);
-        out += std::string("  <vmap:AdBreak timeOffset=\"") + offset +
-               "\" breakType=\"linear\" breakId=\"" + id + "\">\n"
-               "    <vmap:AdSource id=\"" + std::to_string(i + 1) +
-               "\" allowMultipleAds=\"false\" followRedirects=\"true\">\n"
-               "      <vmap:VASTAdData>\n"
-               "        <VAST version=\"3.0\">\n" + copy + "\n"
-               "        </VAST>\n"
-               "      </vmap:VASTAdData>\n"
-               "    </vmap:AdSource>\n"
-               "    <vmap:TrackingEvents>\n"
-               "      <vmap:Tracking event=\"breakStart\">https://ads.bench.example/break?e=start&amp;b=" +
-               id + "</vmap:Tracking>\n"
-               "      <vmap:Tracking event=\"breakEnd\">https://ads.bench.example/break?e=end&amp;b=" +
-               id + "</vmap:Tracking>\n"
-               "    </vmap:TrackingEvents>\n"
-               "  </vmap:AdBreak>\n";
+        out +=
+            std::string("  <vmap:AdBreak timeOffset=\"") + offset +
+            "\" breakType=\"linear\" breakId=\"" + id +
+            "\">\n"
+            "    <vmap:AdSource id=\"" +
+            std::to_string(i + 1) +
+            "\" allowMultipleAds=\"false\" followRedirects=\"true\">\n"
+            "      <vmap:VASTAdData>\n"
+            "        <VAST version=\"3.0\">\n" +
+            copy +
+            "\n"
+            "        </VAST>\n"
+            "      </vmap:VASTAdData>\n"
+            "    </vmap:AdSource>\n"
+            "    <vmap:TrackingEvents>\n"
+            "      <vmap:Tracking "
+            "event=\"breakStart\">https://ads.bench.example/break?e=start&amp;b=" +
+            id +
+            "</vmap:Tracking>\n"
+            "      <vmap:Tracking event=\"breakEnd\">https://ads.bench.example/break?e=end&amp;b=" +
+            id +
+            "</vmap:Tracking>\n"
+            "    </vmap:TrackingEvents>\n"
+            "  </vmap:AdBreak>\n";
     }
     out += "</vmap:VMAP>\n";
     return out;

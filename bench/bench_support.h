@@ -3,12 +3,12 @@
 // module reached directly, for the time and memory of its own load of the same buffer.
 #pragma once
 
+#include <benchmark/benchmark.h>
+
 #include <cstddef>
 #include <map>
 #include <string>
 #include <vector>
-
-#include <benchmark/benchmark.h>
 
 #include "ka/vmap_parser_api.h"
 #include "xml_parser_api.h"

@@ -100,8 +100,8 @@ inline Document VastMediaFiles(size_t bytes) {
     return Fill(bytes, std::string(kLinearHead) + "<MediaFiles>",
                 "</MediaFiles>" + std::string(kLinearTail), [](uint32_t i) {
                     return "<MediaFile id=\"" + N(i) +
-                           "\" delivery=\"progressive\" type=\"video/mp4\">https://m.test/" +
-                           N(i) + ".mp4</MediaFile>";
+                           "\" delivery=\"progressive\" type=\"video/mp4\">https://m.test/" + N(i) +
+                           ".mp4</MediaFile>";
                 });
 }
 
@@ -127,8 +127,8 @@ inline Document VastClickTrackings(size_t bytes) {
 // TrackingEvents > Tracking > Ad > ... Each level has a name its parent's handler knows, so a
 // walk that followed depth would follow it; count is the number of levels.
 inline Document Deep(size_t bytes) {
-    static const char* const kLevels[] = {"Ad",       "InLine",         "Creatives", "Creative",
-                                          "Linear",   "TrackingEvents", "Tracking"};
+    static const char* const kLevels[] = {"Ad",     "InLine",         "Creatives", "Creative",
+                                          "Linear", "TrackingEvents", "Tracking"};
     const std::string head = std::string(kVmapHead) +
                              "<vmap:AdBreak breakId=\"deep\"><vmap:AdSource><vmap:VASTAdData>"
                              "<VAST version=\"3.0\">";
@@ -181,20 +181,27 @@ inline Document InlineVastBreaks(size_t bytes) {
         return "<vmap:AdBreak timeOffset=\"00:10:00.000\" breakType=\"linear\" breakId=\"b" + n +
                "\"><vmap:AdSource id=\"" + n +
                "\" allowMultipleAds=\"true\"><vmap:VASTAdData><VAST version=\"3.0\">"
-               "<Ad id=\"in" + n + "\" sequence=\"1\"><InLine><AdSystem>s</AdSystem>"
-               "<AdTitle>t</AdTitle><Impression>https://i.test/p?b=" + n +
-               "</Impression><Creatives><Creative id=\"c" + n +
+               "<Ad id=\"in" +
+               n +
+               "\" sequence=\"1\"><InLine><AdSystem>s</AdSystem>"
+               "<AdTitle>t</AdTitle><Impression>https://i.test/p?b=" +
+               n + "</Impression><Creatives><Creative id=\"c" + n +
                "\"><Linear skipoffset=\"00:00:05\"><Duration>00:00:15</Duration>"
-               "<TrackingEvents><Tracking event=\"start\">https://t.test/s?b=" + n +
-               "</Tracking></TrackingEvents><VideoClicks><ClickThrough>https://l.test/" + n +
+               "<TrackingEvents><Tracking event=\"start\">https://t.test/s?b=" +
+               n + "</Tracking></TrackingEvents><VideoClicks><ClickThrough>https://l.test/" + n +
                "</ClickThrough><ClickTracking>https://c.test/k?b=" + n +
                "</ClickTracking></VideoClicks><MediaFiles><MediaFile delivery=\"progressive\" "
-               "type=\"video/mp4\" width=\"640\" height=\"360\">https://m.test/" + n +
+               "type=\"video/mp4\" width=\"640\" height=\"360\">https://m.test/" +
+               n +
                ".mp4</MediaFile></MediaFiles></Linear></Creative></Creatives></InLine></Ad>"
-               "<Ad id=\"wr" + n + "\" sequence=\"2\"><Wrapper><AdSystem>w</AdSystem>"
-               "<Impression>https://w.test/p?b=" + n +
+               "<Ad id=\"wr" +
+               n +
+               "\" sequence=\"2\"><Wrapper><AdSystem>w</AdSystem>"
+               "<Impression>https://w.test/p?b=" +
+               n +
                "</Impression><Creatives><Creative><Linear><TrackingEvents><Tracking "
-               "event=\"start\">https://w.test/s?b=" + n +
+               "event=\"start\">https://w.test/s?b=" +
+               n +
                "</Tracking></TrackingEvents></Linear></Creative></Creatives></Wrapper></Ad>"
                "</VAST></vmap:VASTAdData></vmap:AdSource></vmap:AdBreak>";
     });
@@ -221,11 +228,13 @@ inline Document WrapperMerge(size_t bytes, const std::string& wrappedUrl) {
                 break;
         }
     }
-    document.text = "<VAST version=\"3.0\"><Ad id=\"w\" sequence=\"1\"><Wrapper>"
-                    "<AdSystem>w</AdSystem><VASTAdTagURI>" + wrappedUrl + "</VASTAdTagURI>" +
-                    impressions + "<Creatives><Creative><Linear><TrackingEvents>" + trackings +
-                    "</TrackingEvents><VideoClicks>" + clicks +
-                    "</VideoClicks></Linear></Creative></Creatives></Wrapper></Ad></VAST>";
+    document.text =
+        "<VAST version=\"3.0\"><Ad id=\"w\" sequence=\"1\"><Wrapper>"
+        "<AdSystem>w</AdSystem><VASTAdTagURI>" +
+        wrappedUrl + "</VASTAdTagURI>" + impressions +
+        "<Creatives><Creative><Linear><TrackingEvents>" + trackings +
+        "</TrackingEvents><VideoClicks>" + clicks +
+        "</VideoClicks></Linear></Creative></Creatives></Wrapper></Ad></VAST>";
     return document;
 }
 

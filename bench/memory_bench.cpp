@@ -170,11 +170,11 @@ int main(int argc, char** argv) {
     benchmark::RunSpecifiedBenchmarks(&reporter);
     benchmark::Shutdown();
 
-    printf("\n%-12s %9s | %-37s | %-24s | %-21s\n", "", "", "  one more Process",
-           "  first Process", "  XML module load");
+    printf("\n%-12s %9s | %-37s | %-24s | %-21s\n", "", "", "  one more Process", "  first Process",
+           "  XML module load");
     printf("%-12s %9s | %7s %10s %6s %10s | %10s %13s | %7s %10s %6s\n", "document", "bytes",
-           "allocs", "allocated", "/byte", "peak", "allocated", "held after", "allocs",
-           "allocated", "/byte");
+           "allocs", "allocated", "/byte", "peak", "allocated", "held after", "allocs", "allocated",
+           "/byte");
     for (const bench::Document& document : bench::Documents()) {
         const std::string again = "ProcessAgain/" + document.name;
         const std::string first = "ProcessFirst/" + document.name;

@@ -94,9 +94,10 @@ KA_BOOL gStop = 1;
 std::string gWorkPath = KA_MODULES_DIR;
 
 bool Process(void* handle, Example& example) {
-    bench::Library().SetParam(handle, KA_PID_VMAP_STOP_FLAG, example.stopDownloads ? &gStop : nullptr);
+    bench::Library().SetParam(handle, KA_PID_VMAP_STOP_FLAG,
+                              example.stopDownloads ? &gStop : nullptr);
     const uint32_t result = bench::Library().Process(handle, example.text.data(),
-                                          static_cast<uint32_t>(example.text.size()));
+                                                     static_cast<uint32_t>(example.text.size()));
     if (result != 0) {
         fprintf(stderr, "%s: Process gave 0x%08x\n", example.name.c_str(), result);
         return false;
@@ -148,9 +149,9 @@ bool Run(const char* label, long cycles, Cycle cycle) {
     }
     figures.last = ResidentKiB();
     const long growth = figures.last - figures.first;
-    printf("%-36s RSS %6ld KiB before, %6ld KiB after %ld, %6ld KiB after %ld: %+ld KiB%s\n",
-           label, figures.start, figures.first, std::min(kFirstCheckpoint, cycles), figures.last,
-           cycles, growth, growth > kMaxGrowthKiB ? "  GROWS" : "");
+    printf("%-36s RSS %6ld KiB before, %6ld KiB after %ld, %6ld KiB after %ld: %+ld KiB%s\n", label,
+           figures.start, figures.first, std::min(kFirstCheckpoint, cycles), figures.last, cycles,
+           growth, growth > kMaxGrowthKiB ? "  GROWS" : "");
     return growth <= kMaxGrowthKiB;
 }
 
@@ -180,9 +181,9 @@ int main(int argc, char** argv) {
             const AdData* first = data != nullptr ? data->firstAd : nullptr;
             printf("%-28s VAST: %u ads, the first %s%s\n", example.name.c_str(),
                    data != nullptr ? data->adCount : 0,
-                   first == nullptr                  ? "missing"
-                   : first->type == AD_TYPE_INLINE   ? "InLine"
-                                                     : "Wrapper",
+                   first == nullptr                ? "missing"
+                   : first->type == AD_TYPE_INLINE ? "InLine"
+                                                   : "Wrapper",
                    example.stopDownloads ? " (its fetch kept off the network)" : "");
         } else {
             AdInfo* info = nullptr;

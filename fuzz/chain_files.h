@@ -17,9 +17,7 @@ namespace kachain {
 
 constexpr int kFiles = 8;
 
-inline std::string FilePath(const std::string& dir, int n) {
-    return dir + "/" + std::to_string(n);
-}
+inline std::string FilePath(const std::string& dir, int n) { return dir + "/" + std::to_string(n); }
 
 // Removes the files a WriteFiles may have left, then the folder.
 inline void RemoveFolder(const std::string& dir) {
@@ -31,8 +29,8 @@ inline void RemoveFolder(const std::string& dir) {
 // the input lacks, so nothing of an earlier input is left. Returns the first document; false
 // in second when a file could not be written.
 inline std::pair<std::pair<const uint8_t*, size_t>, bool> WriteFiles(const std::string& dir,
-                                                                      const uint8_t* data,
-                                                                      size_t size) {
+                                                                     const uint8_t* data,
+                                                                     size_t size) {
     std::vector<std::pair<const uint8_t*, size_t>> parts;
     const uint8_t* start = data;
     for (size_t i = 0; i <= size && parts.size() <= static_cast<size_t>(kFiles); ++i) {

@@ -17,7 +17,7 @@ struct Walk {
     uint64_t sum = 0;
     uint64_t records = 0;
     uint64_t nestedDocuments = 0;  // wrapped documents reached through nested parsers
-    bool countsAgree = true;  // false when a count field disagrees with its list
+    bool countsAgree = true;       // false when a count field disagrees with its list
 
     void Text(const char* text) {
         if (text == nullptr) return;

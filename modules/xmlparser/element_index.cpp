@@ -11,7 +11,7 @@ namespace xmlmodule {
 namespace {
 
 constexpr size_t kAlignment = alignof(Element) > alignof(Attribute) ? alignof(Element)
-                                                                     : alignof(Attribute);
+                                                                    : alignof(Attribute);
 // The smallest block worth a call to malloc.
 constexpr size_t kMinBlockSize = 1024;
 // What an idle handle may keep between loads; an index larger than this is rebuilt in fresh

@@ -5,9 +5,8 @@
 #pragma once
 
 #include <cstddef>
-#include <vector>
-
 #include <pugixml.hpp>
+#include <vector>
 
 namespace xmlmodule {
 

@@ -183,7 +183,8 @@ unsigned int GetNextAttribute(void* handle, void* node, void** next, void* curre
         // on it.
         const uintptr_t first = reinterpret_cast<uintptr_t>(element->attributes);
         const uintptr_t at = reinterpret_cast<uintptr_t>(current);
-        const uintptr_t end = first + sizeof(Attribute) * static_cast<size_t>(element->attributeCount);
+        const uintptr_t end =
+            first + sizeof(Attribute) * static_cast<size_t>(element->attributeCount);
         if (at < first || at >= end || (at - first) % sizeof(Attribute) != 0) return KA_OK;
         index = static_cast<int>((at - first) / sizeof(Attribute)) + 1;
     }

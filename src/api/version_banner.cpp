@@ -14,7 +14,7 @@ static_assert(sizeof(kBanner) == 101, "the banner is 100 characters and a NUL");
 char szVerInfo[512];
 
 class __CShowVersion {
-  public:
+public:
     __CShowVersion() { memcpy(szVerInfo, kBanner, sizeof(kBanner)); }
 };
 

@@ -30,8 +30,7 @@ struct XMLParserAPI {
                                       int* length);
     // Attribute iteration; the library never calls it.
     unsigned int (*GetNextAttribute)(void* handle, void* node, void** next, void* current,
-                                     char** name, int* nameLength, char** value,
-                                     int* valueLength);
+                                     char** name, int* nameLength, char** value, int* valueLength);
     // Element text: the first text or CDATA child, trimmed; CDATA reads "![CDATA[...]]".
     unsigned int (*GetTagValue)(void* handle, void* node, char** text, int* length);
     // Qualified name as written, prefix included.

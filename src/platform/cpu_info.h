@@ -17,7 +17,7 @@ struct CpuInfoSources {
 };
 
 class CCpuInfo {
-  public:
+public:
     // Same as get_cpu_info.
     static int getInfo(CpuInfoRecord* info);
     // Fills the static members from the real files; run once under pthread_once.

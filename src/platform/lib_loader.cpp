@@ -10,8 +10,8 @@ namespace {
 
 // Codec modules that come in a CPU variant ("_v7.so") on processors that can use it.
 const char* const kVariantModules[] = {
-    "kaVidDec",   "kaH264Dec",  "kaH265Dec", "kaMPEG4Dec", "kaVP9Dec", "kaAACDec",
-    "kaMP3Dec",   "kaAC3Dec",   "kaAMRDec",  "kaWMADec",   "kaAudioProc",
+    "kaVidDec", "kaH264Dec", "kaH265Dec", "kaMPEG4Dec", "kaVP9Dec",    "kaAACDec",
+    "kaMP3Dec", "kaAC3Dec",  "kaAMRDec",  "kaWMADec",   "kaAudioProc",
 };
 
 bool IsVariantModule(const char* path) {
@@ -107,9 +107,11 @@ int CLibLoader::LoadLib(void* /*unused*/) {
 
     if (mWorkPath != nullptr && mWorkPath[0] != '\0') {
         ka::CopyBounded(mLibName, sizeof(mLibName), mWorkPath);
-        if (strstr(requested, "lib") == nullptr) ka::AppendBounded(mLibName, sizeof(mLibName), "lib");
+        if (strstr(requested, "lib") == nullptr)
+            ka::AppendBounded(mLibName, sizeof(mLibName), "lib");
         ka::AppendBounded(mLibName, sizeof(mLibName), requested);
-        if (strstr(requested, ".so") == nullptr) ka::AppendBounded(mLibName, sizeof(mLibName), ".so");
+        if (strstr(requested, ".so") == nullptr)
+            ka::AppendBounded(mLibName, sizeof(mLibName), ".so");
         mLibHandle = LoadVariantLib(mLibName);
         if (mLibHandle == nullptr) mLibHandle = mLoadLibrary(mLibName, ka::kModuleLoadNow);
         if (mLibHandle == nullptr) return 0;

@@ -307,7 +307,8 @@ unsigned int CVMAPParser::LoadAdSourceTag(void* node, void* target, char* name,
     if (ka::NameIs(name, length, "vmap:AdTagURI")) {
         // Stored as text only; the player decides whether to fetch it.
         GetElementText(node, source->adTagUri);
-    } else if (ka::NameIs(name, length, "vmap:VASTAdData") || ka::NameIs(name, length, "vmap:VASTData")) {
+    } else if (ka::NameIs(name, length, "vmap:VASTAdData") ||
+               ka::NameIs(name, length, "vmap:VASTData")) {
         // Only the first of either is read.
         if (source->vastAdData != nullptr) return KA_OK;
         source->vastAdData = new VastAdData();

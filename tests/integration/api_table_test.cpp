@@ -123,7 +123,9 @@ TEST(ApiModes, SwitchesReleaseExactlyWhatWasBuilt) {
         std::vector<bool> vastOnly;
         bool flipBeforeClose;
     } kSequences[] = {
-        {{false, true, false, true, true, false}, false}, {{true}, true}, {{false}, true},
+        {{false, true, false, true, true, false}, false},
+        {{true}, true},
+        {{false}, true},
         {{true, false}, true},
     };
     for (const auto& sequence : kSequences) {

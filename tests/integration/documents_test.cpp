@@ -81,9 +81,7 @@ void* Counted(void* pointer) {
 }
 void* malloc(size_t size) { return Counted(__libc_malloc(size)); }
 void* calloc(size_t count, size_t size) { return Counted(__libc_calloc(count, size)); }
-void* memalign(size_t alignment, size_t size) {
-    return Counted(__libc_memalign(alignment, size));
-}
+void* memalign(size_t alignment, size_t size) { return Counted(__libc_memalign(alignment, size)); }
 void* aligned_alloc(size_t alignment, size_t size) { return memalign(alignment, size); }
 int posix_memalign(void** out, size_t alignment, size_t size) {
     *out = memalign(alignment, size);

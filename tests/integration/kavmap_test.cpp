@@ -55,8 +55,8 @@ TEST(Kavmap, JsonIsWhatTheDocumentTestsExpect) {
         // Wrapped files resolve next to the document.
         {"--json --vast " + Data("documents/vast/wrapper-1.xml"), "/dev/null",
          "documents/vast/wrapper-1"},
-        {"--json --vast --no-merge " + Data("documents/vast-no-merge/chain_three.xml"),
-         "/dev/null", "documents/vast-no-merge/chain_three"},
+        {"--json --vast --no-merge " + Data("documents/vast-no-merge/chain_three.xml"), "/dev/null",
+         "documents/vast-no-merge/chain_three"},
     };
     for (const auto& c : kCases) {
         SCOPED_TRACE(c.args);

@@ -54,9 +54,11 @@ TEST(ExtensionParser, OneObjectPerAdOwnedByTheAd) {
         int dummy = 0;
         EXPECT_EQ(parser.SetParam(0x45000002u, &dummy), 0u);  // other ids are ignored
         EXPECT_EQ(parser.mExtensionParser, nullptr);
-        parser.SetParam(KA_PID_VAST_EXTENSION_PARSER, new TestExtensionParser(&parser, &log, result));
-        ASSERT_EQ(parser.Process(&document[0], static_cast<unsigned int>(document.size()), 1, nullptr),
-                  0u);
+        parser.SetParam(KA_PID_VAST_EXTENSION_PARSER,
+                        new TestExtensionParser(&parser, &log, result));
+        ASSERT_EQ(
+            parser.Process(&document[0], static_cast<unsigned int>(document.size()), 1, nullptr),
+            0u);
     };
     {
         CVASTParser parser;

@@ -1,6 +1,4 @@
 // CDATA unwrapping, "&amp;" decoding and clock times; the cases are in tests/data/text_cases.txt.
-#include "xml/text.h"
-
 #include <gtest/gtest.h>
 
 #include <cstring>
@@ -9,6 +7,7 @@
 #include <vector>
 
 #include "ka/result_codes.h"
+#include "xml/text.h"
 
 namespace {
 
