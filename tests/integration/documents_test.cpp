@@ -102,24 +102,11 @@ void* realloc(void* pointer, size_t size) {
 
 // The result code and the records of one Process, as text.
 std::string Print(void* handle, uint32_t result, bool vastOnly) {
-    const VMAPParserAPI& api = katest::Api();
     char* text = nullptr;
     size_t length = 0;
     FILE* out = open_memstream(&text, &length);
     fprintf(out, "result 0x%08" PRIx32 "\n", result);
-    ProcessResult records = {};
-    AdInfo* info = nullptr;
-    api.GetAdInfo(handle, &info);
-    records.adInfo = info;
-    char* contentUri = nullptr;
-    api.GetParam(handle, KA_PID_VMAP_CONTENT_URI, &contentUri);
-    records.contentUri = contentUri;
-    VastAdData* vast = nullptr;
-    api.GetVastAdData(handle, &vast);
-    records.vastAdData = vast;
-    records.nestedVast = api.GetVastParserVastAdData;
-    records.vastOnly = vastOnly;
-    PrintJson(out, records);
+    PrintJson(out, ReadResult(katest::Api(), handle, vastOnly));
     fclose(out);
     std::string printed(text, length);
     free(text);

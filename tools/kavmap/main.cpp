@@ -231,18 +231,7 @@ int Run(const Options& options, const VMAPParserAPI& api, std::vector<char>& doc
         return 1;
     }
 
-    ProcessResult records = {};
-    AdInfo* info = nullptr;
-    api.GetAdInfo(handle, &info);
-    records.adInfo = info;
-    char* contentUri = nullptr;
-    api.GetParam(handle, KA_PID_VMAP_CONTENT_URI, &contentUri);
-    records.contentUri = contentUri;
-    VastAdData* vast = nullptr;
-    api.GetVastAdData(handle, &vast);
-    records.vastAdData = vast;
-    records.nestedVast = api.GetVastParserVastAdData;
-    records.vastOnly = options.vastOnly;
+    const ProcessResult records = ReadResult(api, handle, options.vastOnly);
     if (options.json) {
         PrintJson(stdout, records);
     } else {

@@ -608,3 +608,19 @@ void PrintJson(FILE* out, const ProcessResult& result) {
     JsonVast(out, result.vastAdData, 1, result, 0);
     fputs("\n}\n", out);
 }
+
+ProcessResult ReadResult(const VMAPParserAPI& api, void* handle, bool vastOnly) {
+    ProcessResult records = {};
+    AdInfo* info = nullptr;
+    api.GetAdInfo(handle, &info);
+    records.adInfo = info;
+    char* contentUri = nullptr;
+    api.GetParam(handle, KA_PID_VMAP_CONTENT_URI, &contentUri);
+    records.contentUri = contentUri;
+    VastAdData* vast = nullptr;
+    api.GetVastAdData(handle, &vast);
+    records.vastAdData = vast;
+    records.nestedVast = api.GetVastParserVastAdData;
+    records.vastOnly = vastOnly;
+    return records;
+}

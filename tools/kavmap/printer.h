@@ -5,6 +5,7 @@
 #include <cstdio>
 
 #include "ka/vast_records.h"
+#include "ka/vmap_parser_api.h"
 #include "ka/vmap_records.h"
 
 // Slot 5 of the table: the container of a nested VAST parser object.
@@ -22,6 +23,9 @@ struct ProcessResult {
 // Nested parsers are shown down to this many levels below the document; the library stops
 // following wrappers well before, so deeper ones would only come from a broken record tree.
 constexpr unsigned int kMaxPrintedNesting = 16;
+
+// What the handle lends after a Process, read through the table as a player reads it.
+ProcessResult ReadResult(const VMAPParserAPI& api, void* handle, bool vastOnly);
 
 void PrintText(FILE* out, const ProcessResult& result);
 void PrintJson(FILE* out, const ProcessResult& result);
