@@ -3,6 +3,7 @@
 #ifndef KA_VMAP_PARSER_H
 #define KA_VMAP_PARSER_H
 
+#include "ka/chain_limits.h"
 #include "ka/export.h"
 #include "ka/result_codes.h"
 #include "ka/types.h"

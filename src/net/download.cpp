@@ -61,13 +61,20 @@ enum class StopCheck { kAfterEachAsk, kBeforeEachAsk };
 // the stop flag ends the wait (*size then holds whatever the source last wrote); the module's
 // failure code when the transfer failed.
 uint32_t PollSourceSize(SourceIOApi* api, void* handle, const KA_BOOL* stopFlag, uint64_t* size,
-                        StopCheck check) {
+                        StopCheck check, uint64_t deadline = 0) {
     if (check == StopCheck::kBeforeEachAsk && IsStopped(stopFlag)) return 0;
     for (;;) {
         const uint32_t result = api->GetSourceSize(handle, size);
         if (result == KA_ERR_DOWNLOAD_FAILED) return result;
         if (result == 0) return 0;
         if (check == StopCheck::kAfterEachAsk && IsStopped(stopFlag)) return 0;
+        if (deadline != 0 && GetTimeNs() / 1000000u + kPollMs > deadline) {
+            // One more pause would end past the deadline: wait out what is left, ask once more.
+            const uint64_t now = GetTimeNs() / 1000000u;
+            if (now < deadline) SleepMs(static_cast<uint32_t>(deadline - now));
+            if (api->GetSourceSize(handle, size) == 0) return 0;
+            return KA_ERR_DOWNLOAD_TIMEOUT;
+        }
         SleepMs(kPollMs);
         if (check == StopCheck::kBeforeEachAsk && IsStopped(stopFlag)) return 0;
     }
@@ -273,6 +280,13 @@ uint32_t ReadSourceData(SourceIOApi* api, void* handle, uint8_t* dst, uint32_t* 
 
 uint32_t ka_download_by_url(char* url, unsigned char** data, uint32_t* size, char* workPath,
                             KA_BOOL* stopFlag) {
+    return ka::DownloadDocument(url, data, size, workPath, stopFlag, nullptr);
+}
+
+namespace ka {
+
+uint32_t DownloadDocument(char* url, unsigned char** data, uint32_t* size, char* workPath,
+                          KA_BOOL* stopFlag, DocumentFetch* fetch) {
     if (url == nullptr) return KA_ERR_NULL_ARGUMENT;
     if (data == nullptr || size == nullptr) return KA_ERR_NULL_ARGUMENT;
 
@@ -292,13 +306,18 @@ uint32_t ka_download_by_url(char* url, unsigned char** data, uint32_t* size, cha
         (api.Open != nullptr && api.Close == nullptr)) {
         return KA_ERR_LOAD_FAILED;
     }
-    api.SetParam(nullptr, ka::kSioWorkPath, workPath);
+    api.SetParam(nullptr, kSioWorkPath, workPath);
 
     void* handle = nullptr;
     uint64_t sourceSize = 0;
     uint32_t result = OpenSource(&api, url, &handle, nullptr, nullptr);
     if (result == 0) {
-        result = PollSourceSize(&api, handle, stopFlag, &sourceSize, StopCheck::kBeforeEachAsk);
+        result = PollSourceSize(&api, handle, stopFlag, &sourceSize, StopCheck::kBeforeEachAsk,
+                                fetch != nullptr ? fetch->deadline : 0);
+    }
+    // Nothing of a document over the caller's limit is kept, not even its buffer.
+    if (result == 0 && fetch != nullptr && fetch->maxBytes != 0 && sourceSize > fetch->maxBytes) {
+        result = KA_ERR_LOAD_FAILED;
     }
     if (result == 0) {
         uint32_t count = static_cast<uint32_t>(sourceSize);
@@ -312,9 +331,19 @@ uint32_t ka_download_by_url(char* url, unsigned char** data, uint32_t* size, cha
             result = ReadWhole(&api, handle, buffer, size, stopFlag);
         }
     }
+    if (result == 0 && fetch != nullptr) {
+        // The module answers with the URL reached after redirects; a longer one is not used.
+        char reached[kUrlSize] = {};
+        SourceFinalUrlQuery query = {url, static_cast<uint32_t>(strlen(url)), reached, kUrlSize};
+        const bool known = api.GetParam(handle, kSioFinalUrl, &query) == 0 &&
+                           memchr(reached, '\0', kUrlSize) != nullptr;
+        memcpy(fetch->finalUrl, known ? reached : "", known ? kUrlSize : 1);
+    }
     ReleaseSource(&api, handle);
     return result;
 }
+
+}  // namespace ka
 
 uint32_t DownloadToBuffer(SourceIOApi* api, void* request1, void* request2, void* request3,
                           void* request4, DownloadRecord* record, uint8_t** buffer,

@@ -7,6 +7,7 @@
 
 #include "ka/download.h"
 #include "ka/types.h"
+#include "platform/limits.h"
 
 // Fetches url (handed to the module unchanged) with the module found in workPath (may be null).
 // Once the read stage is reached, *data holds a buffer from array new (owned by the caller, also
@@ -14,6 +15,22 @@
 // null; a flag set by another thread ends the waiting. 0 on success.
 uint32_t ka_download_by_url(char* url, unsigned char** data, uint32_t* size, char* workPath,
                             KA_BOOL* stopFlag);
+
+namespace ka {
+
+// What a wrapped document's download may spend, and what it reports besides the body.
+struct DocumentFetch {
+    uint64_t maxBytes;      // a larger document fails and nothing of it is kept; 0: no limit
+    uint64_t deadline;      // GetTimeNs milliseconds at which the wait ends; 0: none
+    char finalUrl[kUrlSize];  // on success, the URL reached after redirects, or ""
+};
+
+// ka_download_by_url with the limits of fetch (may be null: none). A download still waiting at
+// the deadline ends with KA_ERR_DOWNLOAD_TIMEOUT within one poll of it.
+uint32_t DownloadDocument(char* url, unsigned char** data, uint32_t* size, char* workPath,
+                          KA_BOOL* stopFlag, DocumentFetch* fetch);
+
+}  // namespace ka
 
 // Reads *ioSize bytes into dst; *ioSize then holds the bytes read. maxRetries all ones and
 // timeoutMs 0xFFFFFFFF mean no limit. 0, 1 when the source ended early, 0x91127000 when stopped

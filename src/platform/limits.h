@@ -15,9 +15,5 @@ constexpr int kUrlSize = 2048;
 constexpr int kXmlLoadMode = 160;
 // A wrapper chain follows at most this many hops below the caller's document.
 constexpr unsigned int kMaxWrapperDepth = 10;
-// Wrapped documents fetched for one Process, all depths together: every fetched document may
-// hold several wrappers of its own, so the depth alone lets the number of fetches grow as a
-// power of the depth.
-constexpr unsigned int kMaxWrapperFetches = 64;
 
 }  // namespace ka

@@ -12,7 +12,8 @@ CVASTParser::CVASTParser()
       mExtensionParser(nullptr),
       mMergeWrappers(1),
       mStopFlag(nullptr),
-      mFetchesLeft(ka::kMaxWrapperFetches) {}
+      mFetchesLeft(KA_VMAP_FETCHES_PER_AD),
+      mBudget(nullptr) {}
 
 CVASTParser::~CVASTParser() { CVASTParser::Close(); }
 
@@ -32,16 +33,20 @@ unsigned int CVASTParser::Close() {
 
 unsigned int CVASTParser::Process(void* buffer, unsigned int size, KA_BOOL mergeWrappers,
                                   KA_BOOL* stopFlag) {
-    // The caller's own document starts a new chain.
-    ka::ChainContext chain = ka::ChainContext::Start(mergeWrappers, stopFlag, mWorkPath);
+    // The caller's own document starts a new chain, with the default budget.
+    ka::ChainBudget budget = ka::ChainBudget::Start(KA_VMAP_DEFAULT_FETCH_BYTES, 0);
+    ka::ChainContext chain =
+        ka::ChainContext::Start(mergeWrappers, stopFlag, mWorkPath, &budget, nullptr);
     const unsigned int result = ProcessInChain(buffer, size, chain);
     mFetchesLeft = chain.fetchesLeft;
+    mBudget = nullptr;
     return result;
 }
 
 unsigned int CVASTParser::ProcessInChain(void* buffer, unsigned int size, ka::ChainContext& chain) {
     mMergeWrappers = chain.mergeWrappers;
     mStopFlag = chain.stopFlag;
+    chain.budget->parsedBytes += size;
     // The module takes the size as an int: a larger buffer cannot be loaded.
     if (buffer == nullptr || size > static_cast<unsigned int>(INT_MAX)) return KA_ERR_LOAD_FAILED;
     if (LoadXML(static_cast<char*>(buffer), static_cast<int>(size), ka::kXmlLoadMode) != 0) {
@@ -65,14 +70,19 @@ unsigned int CVASTParser::SetParam(unsigned int id, void* value) {
 unsigned int CVASTParser::GetParam(unsigned int /*id*/, void* /*value*/) { return KA_OK; }
 
 unsigned int CVASTParser::ParseVASTNode(void* node, bool ownsDocument, bool mergeWrappers) {
-    ka::ChainContext chain = {mMergeWrappers, mStopFlag, mFetchesLeft, mWorkPath};
+    ka::ChainBudget budget = ka::ChainBudget::Start(KA_VMAP_DEFAULT_FETCH_BYTES, 0);
+    ka::ChainContext chain =
+        ka::ChainContext::Start(mMergeWrappers, mStopFlag, mWorkPath, &budget, nullptr);
+    chain.fetchesLeft = mFetchesLeft;
     ParseVASTNodeInChain(node, ownsDocument, mergeWrappers, chain);
     mFetchesLeft = chain.fetchesLeft;
+    mBudget = nullptr;
     return KA_OK;
 }
 
 unsigned int CVASTParser::ParseVASTNodeInChain(void* node, bool ownsDocument, bool mergeWrappers,
                                                ka::ChainContext& chain) {
+    mBudget = chain.budget;
     ResetTails();
     LoadTag(node, &mVastAdData, &CVASTParser::LoadVASTTag);
     ResetTails();
@@ -91,6 +101,9 @@ void CVASTParser::WalkWrappers(bool mergeWrappers, ka::ChainContext& chain) {
         AdData* next = ad->next;
         if (ad->type == AD_TYPE_WRAPPER && ad->body != nullptr) {
             if (mVastAdData.depth >= mMaxDepth) break;
+            // Each ad of the caller's document has a fetch budget of its own: an ad that loops
+            // or fans out spends only its own.
+            if (mVastAdData.depth == 0) chain.fetchesLeft = KA_VMAP_FETCHES_PER_AD;
             // A failed fetch leaves no nested parser, and the merge then leaves the ad as read.
             if (static_cast<AdWrapper*>(ad->body)->vastAdTagUri != nullptr) {
                 FetchWrapper(ad, chain);

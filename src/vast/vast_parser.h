@@ -97,6 +97,7 @@ public:
     // to the list lengths.
     unsigned int MergeLinear(AdCreative* wrapperCreative, AdCreative* inlineCreative);
     // Deep copies in list order, each node and string newly allocated; null for a null list.
+    // Past the Process's share of merge copies (ka::ChainBudget) a list is copied only in part.
     AdImpression* CopyImpressionList(AdImpression* list);
     AdClick* CopyClickList(AdClick* list);
     AdTracking* CopyTrackingList(AdTracking* list);
@@ -115,12 +116,18 @@ public:
     KA_BOOL mMergeWrappers;              // merge flag of the last Process, for nested parsers
     KA_BOOL* mStopFlag;                  // stop flag of the last Process; null without one
     unsigned int mFetchesLeft;           // fetches left to the last chain this parser headed
+    ka::ChainBudget* mBudget;            // the budget of the chain being read; null: none
 
 private:
     // <Extensions> of an InLine or Wrapper into its extensions field: the Parse result.
     unsigned int LoadExtensions(void* node, CAdExtensions*& extensions);
     // Wrapper ads of mVastAdData, in list order, while this document is above the depth limit.
     void WalkWrappers(bool mergeWrappers, ka::ChainContext& chain);
+    // The URL to fetch for a wrapper's reference, seen from documentUrl (may be null) into out
+    // (kUrlSize bytes); false when it does not fit or is not allowed from that document.
+    static bool ResolveWrappedUrl(const char* reference, const char* documentUrl, char* out);
+    // Charges one merge copy to the budget; false when it is spent.
+    bool TakeCopy(size_t recordBytes, const char* text);
     // The one merge primitive of MergeCreatives and MergeLinear: appends copies of the click
     // tracking, custom clicks (of each source's first VideoClicks) and tracking events of count
     // Linear sources, in their order, to target, walking each list of target to its end once.

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "ka/result_codes.h"
+#include "ka/uri.h"
 #include "net/download.h"
 #include "vast/vast_parser.h"
 #include "vast/vast_release.h"
@@ -14,6 +15,10 @@
 #include "xml/text.h"
 
 namespace {
+
+bool IsWebUrl(const char* url) {
+    return strncmp(url, "http://", 7) == 0 || strncmp(url, "https://", 8) == 0;
+}
 
 AdLinear* LinearOf(AdCreative* creative) {
     return creative != nullptr && creative->kind == AD_CREATIVE_LINEAR ? &creative->content
@@ -30,6 +35,12 @@ bool HasClicks(const AdVideoClicks* clicks) {
 unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     if (ad == nullptr || ad->body == nullptr || ad->type != AD_TYPE_WRAPPER) return KA_OK;
     AdWrapper* wrapper = static_cast<AdWrapper*>(ad->body);
+    ka::ChainBudget& budget = *chain.budget;
+    if (budget.DeadlinePassed() || budget.fetchBytesLeft == 0) return KA_ERR_LOAD_FAILED;
+    char url[ka::kUrlSize];
+    if (!ResolveWrappedUrl(wrapper->vastAdTagUri, chain.documentUrl, url)) {
+        return KA_ERR_LOAD_FAILED;
+    }
 
     // Without a caller's flag (a VAST element of a VMAP document) downloads get one that stays
     // false: the download needs a flag to read.
@@ -38,12 +49,14 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     if (!chain.TakeFetch()) return KA_ERR_LOAD_FAILED;
     unsigned char* buffer = nullptr;
     uint32_t size = 0;
+    ka::DocumentFetch fetch = {budget.fetchBytesLeft, budget.deadline, {}};
     const uint32_t downloaded =
-        ka_download_by_url(wrapper->vastAdTagUri, &buffer, &size, chain.workPath, stopFlag);
+        ka::DownloadDocument(url, &buffer, &size, chain.workPath, stopFlag, &fetch);
     if (downloaded != 0 || size == 0 || buffer == nullptr) {
         delete[] buffer;
         return KA_ERR_LOAD_FAILED;
     }
+    budget.fetchBytesLeft -= size;
 
     CVASTParser* nested = new CVASTParser();
     wrapper->nestedParser = nested;
@@ -51,11 +64,33 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     // A failed load shows up as a failed Process below.
     nested->InitXMLParser();
     nested->mVastAdData.depth = mVastAdData.depth + 1;
-    // The nested parser reads the document and runs its own wrappers before this returns.
-    const unsigned int result = nested->ProcessInChain(buffer, size, chain);
+    // The nested parser reads the document and runs its own wrappers before this returns; its
+    // relative references are seen from where the document was finally fetched.
+    ka::ChainContext inner = chain;
+    inner.documentUrl = fetch.finalUrl[0] != '\0' ? fetch.finalUrl : url;
+    const unsigned int result = nested->ProcessInChain(buffer, size, inner);
+    chain.fetchesLeft = inner.fetchesLeft;
     delete[] buffer;
     nested->Close();
     return result;
+}
+
+bool CVASTParser::ResolveWrappedUrl(const char* reference, const char* documentUrl,
+                                    char* out) {
+    if (reference == nullptr) return false;
+    const size_t length = strnlen(reference, ka::kUrlSize);
+    // A reference that does not fit is refused rather than fetched cut short.
+    if (length >= ka::kUrlSize) return false;
+    if (documentUrl == nullptr || documentUrl[0] == '\0') {
+        memcpy(out, reference, length + 1);
+        return true;
+    }
+    memset(out, 0, ka::kUrlSize);
+    ResolveURI(out, const_cast<char*>(reference), const_cast<char*>(documentUrl));
+    // ResolveURI cuts at kUrlSize - 1 characters: a result that long may have been cut.
+    if (strnlen(out, ka::kUrlSize) >= ka::kUrlSize - 1) return false;
+    // What came over the network may send the player only to the network.
+    return !IsWebUrl(documentUrl) || IsWebUrl(out);
 }
 
 unsigned int CVASTParser::MergeWrapper(AdData* ad) {
@@ -74,7 +109,9 @@ unsigned int CVASTParser::MergeWrapper(AdData* ad) {
                 delete deeper;
                 innerWrapper->nestedParser = nullptr;
             }
-        } else if (inner->type == AD_TYPE_INLINE && inner->body != nullptr) {
+        } else if (inner == wrapped.firstAd && inner->type == AD_TYPE_INLINE &&
+                   inner->body != nullptr) {
+            // Only the first ad survives the merge, so only it receives the wrapper's tracking.
             AdInLine* inLine = static_cast<AdInLine*>(inner->body);
             ka::ListEnd<AdImpression> end = ka::FindEnd(&inLine->impressions);
             ka::Attach(end, CopyImpressionList(wrapper->impressions));
@@ -179,6 +216,7 @@ AdImpression* CVASTParser::CopyImpressionList(AdImpression* list) {
     AdImpression* head = nullptr;
     AdImpression** link = &head;
     for (; list != nullptr; list = list->next) {
+        if (!TakeCopy(sizeof(AdImpression), list->url)) break;
         AdImpression* copy = new AdImpression();
         copy->url = ka::CopyString(list->url);
         *link = copy;
@@ -191,6 +229,7 @@ AdClick* CVASTParser::CopyClickList(AdClick* list) {
     AdClick* head = nullptr;
     AdClick** link = &head;
     for (; list != nullptr; list = list->next) {
+        if (!TakeCopy(sizeof(AdClick) + ka::CopySize(list->id), list->url)) break;
         AdClick* copy = new AdClick();
         copy->id = ka::CopyString(list->id);
         copy->url = ka::CopyString(list->url);
@@ -204,6 +243,7 @@ AdTracking* CVASTParser::CopyTrackingList(AdTracking* list) {
     AdTracking* head = nullptr;
     AdTracking** link = &head;
     for (; list != nullptr; list = list->next) {
+        if (!TakeCopy(sizeof(AdTracking) + ka::CopySize(list->event), list->url)) break;
         AdTracking* copy = new AdTracking();
         copy->event = ka::CopyString(list->event);
         copy->offsetKind = list->offsetKind;
@@ -213,4 +253,8 @@ AdTracking* CVASTParser::CopyTrackingList(AdTracking* list) {
         link = &copy->next;
     }
     return head;
+}
+
+bool CVASTParser::TakeCopy(size_t recordBytes, const char* text) {
+    return mBudget == nullptr || mBudget->TakeMergeBytes(recordBytes + ka::CopySize(text));
 }

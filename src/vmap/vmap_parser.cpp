@@ -25,7 +25,11 @@ CVMAPParser::CVMAPParser()
       mVastOnly(0),
       mMergeWrappers(1),
       mStopFlag(nullptr),
-      mInlineChain(ka::ChainContext::Start(1, nullptr, nullptr)),
+      mFetchBytes(KA_VMAP_DEFAULT_FETCH_BYTES),
+      mDeadlineMs(0),
+      mBaseUrl(),
+      mBudget(ka::ChainBudget::Start(KA_VMAP_DEFAULT_FETCH_BYTES, 0)),
+      mInlineChain(ka::ChainContext::Start(1, nullptr, nullptr, &mBudget, nullptr)),
       mBreakTail(),
       mTrackingTail(),
       mBuiltVastOnly(0) {}
@@ -60,15 +64,21 @@ void CVMAPParser::ReleaseAll() {
 
 unsigned int CVMAPParser::Process(void* buffer, unsigned int size) {
     ReleaseAll();
+    mBudget = ka::ChainBudget::Start(mFetchBytes, mDeadlineMs);
+    const char* baseUrl = mBaseUrl.empty() ? nullptr : mBaseUrl.c_str();
     if (mVastOnly == 1) {
         mBuiltVastOnly = 1;
         CreateVASTParser();
         // Without a flag of the caller's the chain's downloads get one that stays false.
-        return mVastParser->Process(buffer, size, mMergeWrappers != 0 ? 1 : 0, mStopFlag);
+        ka::ChainContext chain = ka::ChainContext::Start(mMergeWrappers != 0 ? 1 : 0, mStopFlag,
+                                                         mWorkPath, &mBudget, baseUrl);
+        return mVastParser->ProcessInChain(buffer, size, chain);
     }
-    // The VAST elements of one document share a chain, and with it one fetch budget. Their
-    // downloads get no stop flag: the caller's is for VAST-only mode.
-    mInlineChain = ka::ChainContext::Start(mMergeWrappers != 0 ? 1 : 0, nullptr, mWorkPath);
+    // The VAST elements of one document share the Process's budget. Their downloads get no stop
+    // flag: the caller's is for VAST-only mode. The merge setting decides only what becomes of
+    // the elements' own wrappers: nested parsers always merge.
+    mInlineChain = ka::ChainContext::Start(1, nullptr, mWorkPath, &mBudget, baseUrl);
+    mBudget.parsedBytes = size;
     if (buffer == nullptr || size == 0 || size > static_cast<unsigned int>(INT_MAX)) {
         return KA_ERR_LOAD_FAILED;
     }
@@ -105,6 +115,19 @@ unsigned int CVMAPParser::SetParam(unsigned int id, void* value) {
         case KA_PID_VMAP_STOP_FLAG:
             mStopFlag = static_cast<KA_BOOL*>(value);
             break;
+        case KA_PID_VMAP_FETCH_BYTES: {
+            const uintptr_t bytes = reinterpret_cast<uintptr_t>(value);
+            mFetchBytes = bytes != 0 ? bytes : KA_VMAP_DEFAULT_FETCH_BYTES;
+            break;
+        }
+        case KA_PID_VMAP_DEADLINE_MS: {
+            const uintptr_t ms = reinterpret_cast<uintptr_t>(value);
+            mDeadlineMs = ms > UINT32_MAX ? UINT32_MAX : static_cast<uint32_t>(ms);
+            break;
+        }
+        case KA_PID_VMAP_BASE_URL:
+            mBaseUrl = value != nullptr ? static_cast<const char*>(value) : "";
+            break;
         default:
             break;
     }
@@ -119,6 +142,15 @@ unsigned int CVMAPParser::GetParam(unsigned int id, void* value) {
             break;
         case KA_PID_VMAP_VAST_ONLY:
             *static_cast<unsigned int*>(value) = mVastOnly == 1 ? 1 : 0;
+            break;
+        case KA_PID_VMAP_FETCH_BYTES:
+            *static_cast<uint64_t*>(value) = mFetchBytes;
+            break;
+        case KA_PID_VMAP_DEADLINE_MS:
+            *static_cast<uint32_t*>(value) = mDeadlineMs;
+            break;
+        case KA_PID_VMAP_BASE_URL:
+            *static_cast<const char**>(value) = mBaseUrl.empty() ? nullptr : mBaseUrl.c_str();
             break;
         default:
             break;

@@ -5,6 +5,8 @@
 // the handle owns.
 #pragma once
 
+#include <string>
+
 #include "ka/types.h"
 #include "ka/vast_records.h"
 #include "ka/vmap_records.h"
@@ -77,6 +79,12 @@ private:
     void ReadContentUri(void* extensions);
     // Frees the VAST records of an ad source's block, then the block.
     void ReleaseVastBlock(VastAdData* block);
+    // What each Process may spend on its wrapper chains, from the parameters of
+    // "ka/chain_limits.h"; the budget is started anew by each Process.
+    uint64_t mFetchBytes;
+    uint32_t mDeadlineMs;
+    std::string mBaseUrl;  // empty: none
+    ka::ChainBudget mBudget;
     // The chain of the VAST elements of the last VMAP Process, started by that Process.
     ka::ChainContext mInlineChain;
     // The last records appended, so that long lists are filled in linear time.

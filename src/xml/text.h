@@ -49,5 +49,7 @@ int ParseDecimal(const char* text);
 char* CopyText(const char* text, size_t length);
 // A new[] copy of a terminated string; null for null.
 char* CopyString(const char* text);
+// The bytes CopyString allocates for text; 0 for null.
+inline size_t CopySize(const char* text) { return text == nullptr ? 0 : strlen(text) + 1; }
 
 }  // namespace ka
