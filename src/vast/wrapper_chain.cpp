@@ -77,7 +77,8 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
 
 bool CVASTParser::ResolveWrappedUrl(const char* reference, const char* documentUrl,
                                     char* out) {
-    if (reference == nullptr) return false;
+    // An empty reference would resolve to the naming document itself: it names nothing.
+    if (reference == nullptr || reference[0] == '\0') return false;
     const size_t length = strnlen(reference, ka::kUrlSize);
     // A reference that does not fit is refused rather than fetched cut short.
     if (length >= ka::kUrlSize) return false;
