@@ -317,6 +317,7 @@ uint32_t DownloadDocument(char* url, unsigned char** data, uint32_t* size, char*
     }
     // Nothing of a document over the caller's limit is kept, not even its buffer.
     if (result == 0 && fetch != nullptr && fetch->maxBytes != 0 && sourceSize > fetch->maxBytes) {
+        fetch->overLimit = true;
         result = KA_ERR_LOAD_FAILED;
     }
     if (result == 0) {

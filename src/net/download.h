@@ -20,9 +20,10 @@ namespace ka {
 
 // What a wrapped document's download may spend, and what it reports besides the body.
 struct DocumentFetch {
-    uint64_t maxBytes;      // a larger document fails and nothing of it is kept; 0: no limit
-    uint64_t deadline;      // GetTimeNs milliseconds at which the wait ends; 0: none
+    uint64_t maxBytes;        // a larger document fails and nothing of it is kept; 0: no limit
+    uint64_t deadline;        // GetTimeNs milliseconds at which the wait ends; 0: none
     char finalUrl[kUrlSize];  // on success, the URL reached after redirects, or ""
+    bool overLimit;           // set when the document was larger than maxBytes
 };
 
 // ka_download_by_url with the limits of fetch (may be null: none). A download still waiting at

@@ -20,8 +20,8 @@ ChainBudget ChainBudget::Start(uint64_t fetchBytes, uint32_t deadlineMs) {
 bool ChainBudget::DeadlinePassed() const { return deadline != 0 && NowMs() >= deadline; }
 
 bool ChainBudget::TakeMergeBytes(size_t bytes) {
-    const uint64_t cap = KA_VMAP_MERGE_BYTES_FLOOR +
-                         uint64_t{KA_VMAP_MERGE_BYTES_PER_PARSED_BYTE} * parsedBytes;
+    const uint64_t cap =
+        KA_VMAP_MERGE_BYTES_FLOOR + uint64_t{KA_VMAP_MERGE_BYTES_PER_PARSED_BYTE} * parsedBytes;
     if (mergeBytes + bytes <= cap) {
         mergeBytes += bytes;
         return true;
@@ -29,8 +29,9 @@ bool ChainBudget::TakeMergeBytes(size_t bytes) {
     if (!mergeCapLogged) {
         mergeCapLogged = true;
         kalogPrint_ConstStr0x010d0000(
-            0, "kaVMAPParser: merge copies reached their share of the parsed documents; "
-               "further wrapper tracking is not copied");
+            0,
+            "kaVMAPParser: merge copies reached their share of the parsed documents; "
+            "further wrapper tracking is not copied");
     }
     return false;
 }

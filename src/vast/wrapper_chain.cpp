@@ -49,9 +49,12 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     if (!chain.TakeFetch()) return KA_ERR_LOAD_FAILED;
     unsigned char* buffer = nullptr;
     uint32_t size = 0;
-    ka::DocumentFetch fetch = {budget.fetchBytesLeft, budget.deadline, {}};
+    ka::DocumentFetch fetch = {budget.fetchBytesLeft, budget.deadline, {}, false};
     const uint32_t downloaded =
         ka::DownloadDocument(url, &buffer, &size, chain.workPath, stopFlag, &fetch);
+    // What is left of the byte budget would not hold a document of the size ad servers send:
+    // the later wrappers are not fetched at all.
+    if (fetch.overLimit) budget.fetchBytesLeft = 0;
     if (downloaded != 0 || size == 0 || buffer == nullptr) {
         delete[] buffer;
         return KA_ERR_LOAD_FAILED;
@@ -75,8 +78,7 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     return result;
 }
 
-bool CVASTParser::ResolveWrappedUrl(const char* reference, const char* documentUrl,
-                                    char* out) {
+bool CVASTParser::ResolveWrappedUrl(const char* reference, const char* documentUrl, char* out) {
     // An empty reference would resolve to the naming document itself: it names nothing.
     if (reference == nullptr || reference[0] == '\0') return false;
     const size_t length = strnlen(reference, ka::kUrlSize);

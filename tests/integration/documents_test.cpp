@@ -2,7 +2,7 @@
 // modules and printed as kavmap --json prints it; the output must equal <name>.out beside the
 // document, byte for byte. Documents named *.wrapped.xml are fetched by the cases' wrappers.
 // The folder names the mode: vmap, vmap-no-merge, vast, vast-no-merge. Wrapped documents are
-// read as local files below the case's folder.
+// read as local files below the case's folder, the base URL of each case being its own file.
 //
 // Each case is processed twice on one handle (the second Process must release the first's
 // records and build the same again), and the heap in use must be the same before Open and after
@@ -19,6 +19,7 @@
 #include <vector>
 
 #include "api_support.h"
+#include "ka/chain_limits.h"
 #include "printer.h"
 
 namespace {
@@ -138,6 +139,9 @@ TEST_P(Documents, ReadIntoTheExpectedRecords) {
         ASSERT_EQ(api.Open(&handle, &workPath[0]), KA_OK);
         api.SetParam(handle, KA_PID_VMAP_VAST_ONLY, vastOnly ? katest::kUntouched : nullptr);
         api.SetParam(handle, KA_PID_VMAP_MERGE_WRAPPERS, merge ? katest::kUntouched : nullptr);
+        // As a player that read the document from a file: relative references resolve from it.
+        std::string base = "file://localhost" + folder + c.name + ".xml";
+        api.SetParam(handle, KA_PID_VMAP_BASE_URL, &base[0]);
         // Between the two readings, another document of another size on the same handle.
         int read = 0;
         for (const std::vector<char>* input : {&document, &Interleaved(), &document}) {
