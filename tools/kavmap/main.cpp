@@ -11,6 +11,7 @@
 #include <string>
 #include <vector>
 
+#include "ka/chain_limits.h"
 #include "ka/download.h"
 #include "ka/vmap_parser_api.h"
 #include "printer.h"
@@ -26,6 +27,8 @@ struct Options {
     bool vastOnly = false;
     bool merge = true;
     bool json = false;
+    unsigned long timeoutSeconds = 10;  // every download of the Process together; 0: none
+    std::string baseUrl;                // where the document came from
     std::string modulesDir;
     std::string libPath;
     std::string document;
@@ -33,11 +36,13 @@ struct Options {
 
 int Usage() {
     fputs(
-        "usage: kavmap [--vast] [--no-merge] [--json] [--modules DIR] [--lib PATH] DOCUMENT\n"
+        "usage: kavmap [--vast] [--no-merge] [--json] [--timeout SECONDS] [--modules DIR]\n"
+        "              [--lib PATH] DOCUMENT\n"
         "  DOCUMENT     a VMAP file, - for standard input, or an http(s) URL\n"
         "  --vast       read DOCUMENT as a bare VAST document\n"
         "  --no-merge   do not merge wrapper ads into the ads they lead to\n"
         "  --json       print the records as JSON\n"
+        "  --timeout    seconds all downloads of wrapped documents may take (default 10, 0: none)\n"
         "  --modules    folder of the platform modules (default: ../modules next to kavmap)\n"
         "  --lib        the parser library (default: ../lib/libkaVMAPParser.so next to kavmap)\n",
         stderr);
@@ -65,6 +70,14 @@ int ParseArguments(int argc, char** argv, Options& options) {
             options.merge = false;
         } else if (arg == "--json") {
             options.json = true;
+        } else if (arg == "--timeout") {
+            char* end = nullptr;
+            if (i + 1 >= argc) return Usage();
+            const unsigned long seconds = strtoul(argv[++i], &end, 10);
+            if (end == argv[i] || *end != '\0' || argv[i][0] == '-' || seconds > 86400) {
+                return Usage();
+            }
+            options.timeoutSeconds = seconds;
         } else if (arg == "--modules" || arg == "--lib") {
             if (i + 1 >= argc || argv[i + 1][0] == '\0') return Usage();
             (arg == "--lib" ? options.libPath : options.modulesDir) = argv[++i];
@@ -176,7 +189,7 @@ std::string DocumentDir(const std::string& document) {
 
 // Fetches url through the library's DownloadToBuffer; false with a message on failure.
 bool FetchDocument(void* library, SourceModule& module, const std::string& url,
-                   std::vector<char>& data) {
+                   std::vector<char>& data, std::string& finalUrl) {
     // Resolved at run time like the rest of the library, with the public declaration's type.
     auto download =
         reinterpret_cast<decltype(&DownloadToBuffer)>(dlsym(library, "DownloadToBuffer"));
@@ -199,6 +212,7 @@ bool FetchDocument(void* library, SourceModule& module, const std::string& url,
                                      &buffer, &capacity, &bytesRead, nullptr, 0, nullptr, nullptr);
     if (result == KA_OK && buffer != nullptr && bytesRead <= capacity) {
         data.assign(buffer, buffer + bytesRead);
+        finalUrl = record.finalURL[0] != '\0' ? record.finalURL : url;
     }
     delete[] buffer;
     if (result != KA_OK) {
@@ -221,6 +235,10 @@ int Run(const Options& options, const VMAPParserAPI& api, std::vector<char>& doc
                  reinterpret_cast<void*>(static_cast<uintptr_t>(options.vastOnly)));
     api.SetParam(handle, KA_PID_VMAP_MERGE_WRAPPERS,
                  reinterpret_cast<void*>(static_cast<uintptr_t>(options.merge)));
+    api.SetParam(handle, KA_PID_VMAP_DEADLINE_MS,
+                 reinterpret_cast<void*>(static_cast<uintptr_t>(options.timeoutSeconds * 1000)));
+    std::string baseUrl = options.baseUrl;
+    if (!baseUrl.empty()) api.SetParam(handle, KA_PID_VMAP_BASE_URL, &baseUrl[0]);
 
     char empty = '\0';
     result = api.Process(handle, document.empty() ? &empty : document.data(),
@@ -274,13 +292,20 @@ int main(int argc, char** argv) {
             dlclose(library);
             return 1;
         }
-        if (!FetchDocument(library, module, options.document, document)) {
+        if (!FetchDocument(library, module, options.document, document, options.baseUrl)) {
             dlclose(library);
             return 1;
         }
     } else if (module.ok()) {
         const std::string dir = DocumentDir(options.document);
         if (!dir.empty()) module.AllowFilesBelow(dir);
+        // Relative references resolve from the file itself ("-": from the current folder).
+        char file[PATH_MAX];
+        if (options.document == "-") {
+            if (!dir.empty()) options.baseUrl = "file://localhost" + dir;
+        } else if (realpath(options.document.c_str(), file) != nullptr) {
+            options.baseUrl = std::string("file://localhost") + file;
+        }
     }
     const int status = Run(options, api, document);
     dlclose(library);
