@@ -4,6 +4,7 @@
 #include <cstdlib>
 #include <string>
 
+#include "ka/chain_limits.h"
 #include "no_network.h"
 #include "record_walk.h"
 
@@ -66,6 +67,10 @@ uint32_t RunDocument(const uint8_t* data, size_t size, const RunOptions& options
     if (api.Open(&handle, &gWorkPath[0]) != 0) abort();
     api.SetParam(handle, KA_PID_VMAP_STOP_FLAG, options.stopped ? &gStop : &gNeverStop);
     api.SetParam(handle, KA_PID_VMAP_MERGE_WRAPPERS, options.merge ? &gStop : nullptr);
+    api.SetParam(handle, KA_PID_VMAP_FETCH_BYTES, reinterpret_cast<void*>(options.fetchBytes));
+    api.SetParam(handle, KA_PID_VMAP_DEADLINE_MS,
+                 reinterpret_cast<void*>(static_cast<uintptr_t>(options.deadlineMs)));
+    api.SetParam(handle, KA_PID_VMAP_BASE_URL, const_cast<char*>(options.baseUrl));
     const uint32_t result = ProcessAndWalk(api, handle, data, size, options.vastOnly);
     // The same bytes once more in the other mode: switching modes must release exactly what
     // the first Process built.

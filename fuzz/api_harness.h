@@ -17,9 +17,12 @@ const VMAPParserAPI& Setup(const char* fileDir = nullptr);
 
 // How one document is run.
 struct RunOptions {
-    bool vastOnly = false;  // the mode of the first Process
-    bool stopped = true;    // the stop flag is already set: VAST-only downloads never start
-    bool merge = true;      // wrapper ads are merged into the ads they lead to
+    bool vastOnly = false;          // the mode of the first Process
+    bool stopped = true;            // the stop flag is already set: VAST-only downloads never start
+    bool merge = true;              // wrapper ads are merged into the ads they lead to
+    uint64_t fetchBytes = 0;        // KA_PID_VMAP_FETCH_BYTES; 0: the default
+    uint32_t deadlineMs = 0;        // KA_PID_VMAP_DEADLINE_MS; 0: none
+    const char* baseUrl = nullptr;  // KA_PID_VMAP_BASE_URL
 };
 
 // One document through a fresh handle on the build's modules: Open, Process in the first mode,
