@@ -2,7 +2,8 @@
 // own curl multi handle: Open starts it, GetSourceSize and Read drive it without blocking, and
 // the whole body is kept in memory until Uninit. URLs come from ad servers, so only http and
 // https are fetched (also behind redirects), TLS is verified, redirects, time and size are
-// bounded; local files are read only when the host allows them module-wide.
+// bounded; local files are read only when the host allows them module-wide, and only inside the
+// base folder it names.
 #include <curl/curl.h>
 #include <fcntl.h>
 #include <strings.h>
@@ -143,13 +144,44 @@ bool FilePath(const Source* source, char* path, size_t size) {
     return Fits(snprintf(path, size, "%s%s%s", base, slash ? "/" : "", url), size);
 }
 
-// Reads a regular file whole; devices and pipes are refused so that nothing blocks.
+// Whether the real path real lies inside the real folder realBase: a prefix that ends on a
+// component boundary, so that "/base2/x" is not inside "/base".
+bool Inside(const char* real, const char* realBase) {
+    size_t length = strlen(realBase);
+    while (length > 0 && realBase[length - 1] == '/') --length;  // "/" itself keeps length 0
+    return strncmp(real, realBase, length) == 0 && real[length] == '/';
+}
+
+// Whether the file open as fd is, by the kernel's account, still the one inside realBase: a
+// folder swapped for a symlink between the check and the open shows here. Without /proc the
+// check made before the open stands.
+bool OpenedInside(int fd, const char* realBase) {
+    char link[64];
+    char opened[PATH_MAX];
+    snprintf(link, sizeof(link), "/proc/self/fd/%d", fd);
+    const ssize_t n = readlink(link, opened, sizeof(opened));
+    if (n < 0) return true;
+    if (static_cast<size_t>(n) >= sizeof(opened)) return false;
+    opened[n] = '\0';
+    return Inside(opened, realBase);
+}
+
+// Reads a regular file whole when its real path, symlinks resolved, lies inside the real base
+// folder; with no base folder nothing is read. Devices and pipes are refused so that nothing
+// blocks.
 bool ReadFile(Source* source, const char* path) {
-    const int fd = open(path, O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    char realBase[PATH_MAX];
+    char real[PATH_MAX];
+    if (source->settings.baseDir[0] == '\0' ||
+        realpath(source->settings.baseDir, realBase) == nullptr ||
+        realpath(path, real) == nullptr || !Inside(real, realBase)) {
+        return false;
+    }
+    const int fd = open(real, O_RDONLY | O_NONBLOCK | O_CLOEXEC | O_NOFOLLOW);
     if (fd < 0) return false;
     struct stat info = {};
-    bool ok = fstat(fd, &info) == 0 && S_ISREG(info.st_mode) && info.st_size >= 0 &&
-              static_cast<uint64_t>(info.st_size) <= ka::kSioMaxBodySize;
+    bool ok = OpenedInside(fd, realBase) && fstat(fd, &info) == 0 && S_ISREG(info.st_mode) &&
+              info.st_size >= 0 && static_cast<uint64_t>(info.st_size) <= ka::kSioMaxBodySize;
     if (ok && info.st_size > 0) {
         source->body = static_cast<uint8_t*>(malloc(static_cast<size_t>(info.st_size)));
         ok = source->body != nullptr;

@@ -3,9 +3,11 @@
 #include "ka/download.h"
 
 #include <gtest/gtest.h>
+#include <stdlib.h>
 
 #include <chrono>
 #include <cstdio>
+#include <filesystem>
 #include <fstream>
 #include <memory>
 #include <string>
@@ -19,9 +21,9 @@
 
 namespace {
 
+namespace fs = std::filesystem;
 using Clock = std::chrono::steady_clock;
 using loopback::SetModule;
-using Strings = std::vector<std::string>;
 
 int64_t MsSince(Clock::time_point from) {
     return std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - from).count();
@@ -166,28 +168,65 @@ TEST_F(DownloadTest, ByUrl) {
 }
 
 TEST_F(DownloadTest, FilesOnlyWhenEnabledAndInsideTheBase) {
-    std::ifstream in(kLocal, std::ios::binary);
-    const std::string local((std::istreambuf_iterator<char>(in)), {});
+    // base/ holds the document, a symlink to it and a symlink leading out; base2/ shares the
+    // base's name as a prefix.
+    char pattern[] = "/tmp/ka_sio_XXXXXX";
+    ASSERT_NE(mkdtemp(pattern), nullptr);
+    const std::string tmp = pattern, base = tmp + "/base", in = base + "/local_document.xml";
+    fs::create_directories(base);
+    fs::create_directories(tmp + "/base2");
+    fs::copy_file(kLocal, in);
+    fs::copy_file(kLocal, tmp + "/base2/local_document.xml");
+    fs::copy_file(kLocal, tmp + "/outside.xml");
+    fs::create_symlink("local_document.xml", base + "/alias.xml");
+    fs::create_symlink(tmp + "/outside.xml", base + "/escape.xml");
+    std::ifstream stream(kLocal, std::ios::binary);
+    const std::string local((std::istreambuf_iterator<char>(stream)), {});
     ASSERT_FALSE(local.empty());
-    const std::string file = "file://" + kLocal, toFile = server_.Url("/redirect?to=" + file);
+    const std::string toFile = server_.Url("/redirect?to=file://" + in);
+    // {URL, read when files are allowed}
+    const struct {
+        std::string url;
+        bool readable;
+    } cases[] = {{"file://" + in, true},
+                 {"file://localhost" + in, true},
+                 {in, true},
+                 {"local_document.xml", true},
+                 {"alias.xml", true},  // a symlink that stays inside
+                 // Outside the base: absolute, as a file URL, climbing out, through a symlink, in a
+                 // sibling whose name starts with the base's.
+                 {tmp + "/outside.xml", false},
+                 {"file://" + tmp + "/outside.xml", false},
+                 {"file://" + base + "/../outside.xml", false},
+                 {"escape.xml", false},
+                 {tmp + "/base2/local_document.xml", false},
+                 {kLocal, false},
+                 // Relative references never climb; only regular files; no redirect to a file.
+                 {"../base/local_document.xml", false},
+                 {"x/../../base/local_document.xml", false},
+                 {"net/x.xml", false},
+                 {"missing.xml", false},
+                 {"file://relative.xml", false},
+                 {"/dev/zero", false},
+                 {base, false},
+                 {toFile, false},
+                 {"data:,abc", false},
+                 {"", false},
+                 {"ftp://127.0.0.1:1/x", false},
+                 {"gopher://127.0.0.1:1/", false},
+                 {"dict://127.0.0.1:1/x", false}};
     for (bool allowed : {false, true}) {
         SetModule(ka::kSioAllowFiles, allowed);
         api_.SetParam(nullptr, ka::kSioFileBaseDir,
-                      allowed ? const_cast<char*>(KA_TEST_DATA_DIR "net") : nullptr);
-        // Relative references stay inside the base; only regular files; no redirect to a file.
-        for (const std::string& url :
-             Strings{file, "file://localhost" + kLocal, kLocal, "local_document.xml", "net/x.xml",
-                     "data:,abc", "", "ftp://127.0.0.1:1/x", "gopher://127.0.0.1:1/",
-                     "dict://127.0.0.1:1/x", "../net/local_document.xml",
-                     "x/../../net/local_document.xml", "missing.xml", "file://relative.xml",
-                     "/dev/zero", KA_TEST_DATA_DIR "net", toFile}) {
-            const bool readable = allowed && url.find("local_document") != std::string::npos &&
-                                  url.find("..") == std::string::npos && url != toFile;
-            Fetched r = Fetch(url);
-            EXPECT_EQ(readable ? 0u : KA_ERR_DOWNLOAD_FAILED, r.code) << url << " " << allowed;
-            EXPECT_TRUE(!readable || local == r.text) << url;
+                      allowed ? const_cast<char*>(base.c_str()) : nullptr);
+        for (const auto& c : cases) {
+            const bool readable = allowed && c.readable;
+            Fetched r = Fetch(c.url);
+            EXPECT_EQ(readable ? 0u : KA_ERR_DOWNLOAD_FAILED, r.code) << c.url << " " << allowed;
+            EXPECT_TRUE(!readable || local == r.text) << c.url;
         }
     }
+    fs::remove_all(tmp);
 }
 
 TEST_F(DownloadTest, ToBufferReportsTheFinalUrlKeepsItsBufferAndJoinsTheBase) {
