@@ -119,9 +119,19 @@ bool ClimbsUp(const char* path) {
     }
 }
 
-// Copies src into dst (size bytes), cut to fit and always terminated; null copies as "".
-void CopyBounded(char* dst, size_t size, const char* src) {
-    if (size != 0) snprintf(dst, size, "%s", src != nullptr ? src : "");
+// Copies src whole into dst (size bytes), terminated; null copies as "". A string that does not
+// fit is not cut: dst becomes "" and the answer is false, since a cut URL or path names some
+// other resource.
+bool CopyWhole(char* dst, size_t size, const char* src) {
+    if (size == 0) return false;
+    if (src == nullptr) src = "";
+    const size_t length = strnlen(src, size);
+    if (length >= size) {
+        dst[0] = '\0';
+        return false;
+    }
+    memcpy(dst, src, length + 1);
+    return true;
 }
 
 // Whether snprintf's result says that the whole string went into size bytes.
@@ -242,9 +252,10 @@ void Finish(Source* source, CURLcode code) {
     curl_easy_getinfo(source->easy, CURLINFO_EFFECTIVE_URL, &effective);
     source->httpStatus = static_cast<uint32_t>(status);
     source->redirects = static_cast<uint32_t>(redirects);
-    CopyBounded(source->finalUrl, sizeof(source->finalUrl),
-                effective != nullptr ? effective : source->url);
-    const bool ok = code == CURLE_OK && status >= 200 && status < 400;
+    // A URL reached after redirects that does not fit cannot be reported: the transfer fails.
+    const bool ok = code == CURLE_OK && status >= 200 && status < 400 &&
+                    CopyWhole(source->finalUrl, sizeof(source->finalUrl),
+                              effective != nullptr ? effective : source->url);
     source->state = ok ? State::kDone : State::kFailed;
     StopTransfer(source);
 }
@@ -276,8 +287,11 @@ uint32_t SetModuleParam(uint32_t id, void* value) {
     if (id == ka::kSioWorkPath) return 0;  // modules are found by the host; nothing to keep
     std::lock_guard<std::mutex> lock(gSettingsMutex);
     if (id == ka::kSioFileBaseDir) {
-        CopyBounded(gSettings.baseDir, sizeof(gSettings.baseDir), static_cast<const char*>(value));
-        return 0;
+        // A folder that does not fit leaves none: no file is read rather than one elsewhere.
+        return CopyWhole(gSettings.baseDir, sizeof(gSettings.baseDir),
+                         static_cast<const char*>(value))
+                   ? 0
+                   : kUnknownParam;
     }
     if (value == nullptr) return kUnknownParam;
     switch (id) {
@@ -326,8 +340,12 @@ uint32_t SioInit(void** handle, char* url, uint32_t /*flags*/, void* /*init*/) {
     if (handle == nullptr || url == nullptr) return ka::kSioFailed;
     Source* source = new (std::nothrow) Source();
     if (source == nullptr) return ka::kSioFailed;
-    CopyBounded(source->url, sizeof(source->url), url);
-    CopyBounded(source->finalUrl, sizeof(source->finalUrl), url);
+    // A URL too long for the source is refused; cut, it would fetch some other resource.
+    if (!CopyWhole(source->url, sizeof(source->url), url) ||
+        !CopyWhole(source->finalUrl, sizeof(source->finalUrl), url)) {
+        delete source;
+        return ka::kSioFailed;
+    }
     {
         std::lock_guard<std::mutex> lock(gSettingsMutex);
         source->settings = gSettings;
@@ -415,8 +433,7 @@ uint32_t SioGetParam(void* handle, uint32_t id, void* value) {
             if (source->state != State::kDone || query->out == nullptr || query->outSize == 0) {
                 return kUnknownParam;
             }
-            CopyBounded(query->out, query->outSize, source->finalUrl);
-            return 0;
+            return CopyWhole(query->out, query->outSize, source->finalUrl) ? 0 : kUnknownParam;
         }
         case ka::kSioRetryCount:
             // One attempt per source: the module does not retry on its own.
@@ -445,9 +462,10 @@ uint32_t SioSetParam(void* handle, uint32_t id, void* value) {
             return 0;  // the host's request records carry nothing this stand-in uses
         case ka::kSioHostText:
             if (source->state != State::kCreated) return kUnknownParam;
-            CopyBounded(source->userAgent, sizeof(source->userAgent),
-                        static_cast<const char*>(value));
-            return 0;
+            return CopyWhole(source->userAgent, sizeof(source->userAgent),
+                             static_cast<const char*>(value))
+                       ? 0
+                       : kUnknownParam;
         default:
             return kUnknownParam;
     }

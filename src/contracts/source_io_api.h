@@ -54,7 +54,7 @@ constexpr uint32_t kSioMaxBodySize = KA_DOWNLOAD_MAX_SIZE;
 // ---- Codes ----
 
 // GetSourceSize: the transfer failed (network error, HTTP status >= 400, timeout, body too
-// large, URL not allowed).
+// large, URL not allowed). Init: the URL does not fit the module's 2048 bytes; it is never cut.
 constexpr uint32_t kSioFailed = 0x91127000;
 // GetSourceSize: the body has not fully arrived yet; Read: nothing available yet.
 constexpr uint32_t kSioNotReady = 2;

@@ -130,6 +130,9 @@ protected:
 TEST_F(DownloadTest, ByUrl) {
     // Failures before the read stage give no buffer; once there, a buffer comes back.
     const std::string none = "<none>", big = std::to_string(ka::kSioMaxBodySize + 1);
+    // URLs of 2047 characters (the longest that fits) and 2048, which cut would be the first.
+    const std::string name(KA_DOWNLOAD_URL_SIZE - 1 - server_.Url("/d/").size(), 'n');
+    const std::string fits = server_.Put(name, "fits"), over = server_.Put(name + "n", "over");
     const struct {
         std::string url;
         KA_BOOL stop;
@@ -145,12 +148,14 @@ TEST_F(DownloadTest, ByUrl) {
         {server_.Url("/size/" + big), 0, KA_ERR_DOWNLOAD_FAILED, none},
         {server_.Url("/stall"), 0, KA_ERR_DOWNLOAD_FAILED, none, 300},
         {server_.Url("/d/doc"), 0, KA_ERR_LOAD_FAILED, none, 0, KA_TEST_DATA_DIR "net/"},
+        {fits, 0, 0, "fits"},
+        {over, 0, KA_ERR_DOWNLOAD_FAILED, none},
         // Stopped with no size known: a zero-length buffer. 2 stops as 1 does but reads as success.
         {server_.Url("/stall"), 1, KA_ERR_DOWNLOAD_FAILED, ""},
         {server_.Url("/stall"), 2, 0, ""},
     };
     for (const auto& c : cases) {
-        SCOPED_TRACE(c.url + " stop " + std::to_string(c.stop) + " " + c.workPath);
+        SCOPED_TRACE(c.url.substr(0, 80) + " stop " + std::to_string(c.stop) + " " + c.workPath);
         SetModule(ka::kSioTotalTimeoutMs, c.totalTimeoutMs);
         KA_BOOL stop = c.stop;
         Fetched r = Fetch(c.url, &stop, c.workPath);
