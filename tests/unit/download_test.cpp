@@ -262,6 +262,16 @@ TEST_F(DownloadTest, ToBufferReportsTheFinalUrlKeepsItsBufferAndJoinsTheBase) {
     EXPECT_EQ(server_.Url("/d/dir/doc"), call.record->finalURL);
     // Without the base the reference is used as given, and "doc" is no URL of the module.
     EXPECT_EQ(KA_ERR_DOWNLOAD_FAILED, call.Run(&api_, "doc", nullptr, 0));
+
+    // A reference that, joined to its base, takes 2048 characters fails; cut, it would be the
+    // 2047-character URL that the reference one character shorter reaches.
+    const std::string dir(1900, 'd'), prefix = server_.Url("/d/" + dir + "/");
+    const std::string ref(KA_DOWNLOAD_URL_SIZE - prefix.size(), 'r');
+    server_.Put(dir + "/" + ref.substr(1), "fits");
+    snprintf(call.record->baseURL, KA_DOWNLOAD_URL_SIZE, "%s", (prefix + "index.xml").c_str());
+    EXPECT_EQ(KA_ERR_DOWNLOAD_FAILED, call.Run(&api_, ref, nullptr, 1));
+    EXPECT_EQ(0u, call.Run(&api_, ref.substr(1), nullptr, 1));
+    EXPECT_EQ("fits", call.Text());
 }
 
 TEST_F(DownloadTest, ToBufferLimitsAndFailures) {
