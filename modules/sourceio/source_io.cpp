@@ -2,7 +2,8 @@
 // own curl multi handle: Open starts it, GetSourceSize and Read drive it without blocking, and
 // the whole body is kept in memory until Uninit. URLs come from ad servers, so only http and
 // https are fetched (also behind redirects), TLS is verified, redirects, time and size are
-// bounded; local files are read only when the host allows them module-wide.
+// bounded; local files are read only when the host allows them module-wide, and only inside the
+// base folder it names.
 #include <curl/curl.h>
 #include <fcntl.h>
 #include <strings.h>
@@ -118,9 +119,19 @@ bool ClimbsUp(const char* path) {
     }
 }
 
-// Copies src into dst (size bytes), cut to fit and always terminated; null copies as "".
-void CopyBounded(char* dst, size_t size, const char* src) {
-    if (size != 0) snprintf(dst, size, "%s", src != nullptr ? src : "");
+// Copies src whole into dst (size bytes), terminated; null copies as "". A string that does not
+// fit is not cut: dst becomes "" and the answer is false, since a cut URL or path names some
+// other resource.
+bool CopyWhole(char* dst, size_t size, const char* src) {
+    if (size == 0) return false;
+    if (src == nullptr) src = "";
+    const size_t length = strnlen(src, size);
+    if (length >= size) {
+        dst[0] = '\0';
+        return false;
+    }
+    memcpy(dst, src, length + 1);
+    return true;
 }
 
 // Whether snprintf's result says that the whole string went into size bytes.
@@ -143,13 +154,44 @@ bool FilePath(const Source* source, char* path, size_t size) {
     return Fits(snprintf(path, size, "%s%s%s", base, slash ? "/" : "", url), size);
 }
 
-// Reads a regular file whole; devices and pipes are refused so that nothing blocks.
+// Whether the real path real lies inside the real folder realBase: a prefix that ends on a
+// component boundary, so that "/base2/x" is not inside "/base".
+bool Inside(const char* real, const char* realBase) {
+    size_t length = strlen(realBase);
+    while (length > 0 && realBase[length - 1] == '/') --length;  // "/" itself keeps length 0
+    return strncmp(real, realBase, length) == 0 && real[length] == '/';
+}
+
+// Whether the file open as fd is, by the kernel's account, still the one inside realBase: a
+// folder swapped for a symlink between the check and the open shows here. Without /proc the
+// check made before the open stands.
+bool OpenedInside(int fd, const char* realBase) {
+    char link[64];
+    char opened[PATH_MAX];
+    snprintf(link, sizeof(link), "/proc/self/fd/%d", fd);
+    const ssize_t n = readlink(link, opened, sizeof(opened));
+    if (n < 0) return true;
+    if (static_cast<size_t>(n) >= sizeof(opened)) return false;
+    opened[n] = '\0';
+    return Inside(opened, realBase);
+}
+
+// Reads a regular file whole when its real path, symlinks resolved, lies inside the real base
+// folder; with no base folder nothing is read. Devices and pipes are refused so that nothing
+// blocks.
 bool ReadFile(Source* source, const char* path) {
-    const int fd = open(path, O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    char realBase[PATH_MAX];
+    char real[PATH_MAX];
+    if (source->settings.baseDir[0] == '\0' ||
+        realpath(source->settings.baseDir, realBase) == nullptr ||
+        realpath(path, real) == nullptr || !Inside(real, realBase)) {
+        return false;
+    }
+    const int fd = open(real, O_RDONLY | O_NONBLOCK | O_CLOEXEC | O_NOFOLLOW);
     if (fd < 0) return false;
     struct stat info = {};
-    bool ok = fstat(fd, &info) == 0 && S_ISREG(info.st_mode) && info.st_size >= 0 &&
-              static_cast<uint64_t>(info.st_size) <= ka::kSioMaxBodySize;
+    bool ok = OpenedInside(fd, realBase) && fstat(fd, &info) == 0 && S_ISREG(info.st_mode) &&
+              info.st_size >= 0 && static_cast<uint64_t>(info.st_size) <= ka::kSioMaxBodySize;
     if (ok && info.st_size > 0) {
         source->body = static_cast<uint8_t*>(malloc(static_cast<size_t>(info.st_size)));
         ok = source->body != nullptr;
@@ -210,9 +252,10 @@ void Finish(Source* source, CURLcode code) {
     curl_easy_getinfo(source->easy, CURLINFO_EFFECTIVE_URL, &effective);
     source->httpStatus = static_cast<uint32_t>(status);
     source->redirects = static_cast<uint32_t>(redirects);
-    CopyBounded(source->finalUrl, sizeof(source->finalUrl),
-                effective != nullptr ? effective : source->url);
-    const bool ok = code == CURLE_OK && status >= 200 && status < 400;
+    // A URL reached after redirects that does not fit cannot be reported: the transfer fails.
+    const bool ok = code == CURLE_OK && status >= 200 && status < 400 &&
+                    CopyWhole(source->finalUrl, sizeof(source->finalUrl),
+                              effective != nullptr ? effective : source->url);
     source->state = ok ? State::kDone : State::kFailed;
     StopTransfer(source);
 }
@@ -244,8 +287,11 @@ uint32_t SetModuleParam(uint32_t id, void* value) {
     if (id == ka::kSioWorkPath) return 0;  // modules are found by the host; nothing to keep
     std::lock_guard<std::mutex> lock(gSettingsMutex);
     if (id == ka::kSioFileBaseDir) {
-        CopyBounded(gSettings.baseDir, sizeof(gSettings.baseDir), static_cast<const char*>(value));
-        return 0;
+        // A folder that does not fit leaves none: no file is read rather than one elsewhere.
+        return CopyWhole(gSettings.baseDir, sizeof(gSettings.baseDir),
+                         static_cast<const char*>(value))
+                   ? 0
+                   : kUnknownParam;
     }
     if (value == nullptr) return kUnknownParam;
     switch (id) {
@@ -294,8 +340,12 @@ uint32_t SioInit(void** handle, char* url, uint32_t /*flags*/, void* /*init*/) {
     if (handle == nullptr || url == nullptr) return ka::kSioFailed;
     Source* source = new (std::nothrow) Source();
     if (source == nullptr) return ka::kSioFailed;
-    CopyBounded(source->url, sizeof(source->url), url);
-    CopyBounded(source->finalUrl, sizeof(source->finalUrl), url);
+    // A URL too long for the source is refused; cut, it would fetch some other resource.
+    if (!CopyWhole(source->url, sizeof(source->url), url) ||
+        !CopyWhole(source->finalUrl, sizeof(source->finalUrl), url)) {
+        delete source;
+        return ka::kSioFailed;
+    }
     {
         std::lock_guard<std::mutex> lock(gSettingsMutex);
         source->settings = gSettings;
@@ -383,8 +433,7 @@ uint32_t SioGetParam(void* handle, uint32_t id, void* value) {
             if (source->state != State::kDone || query->out == nullptr || query->outSize == 0) {
                 return kUnknownParam;
             }
-            CopyBounded(query->out, query->outSize, source->finalUrl);
-            return 0;
+            return CopyWhole(query->out, query->outSize, source->finalUrl) ? 0 : kUnknownParam;
         }
         case ka::kSioRetryCount:
             // One attempt per source: the module does not retry on its own.
@@ -413,9 +462,10 @@ uint32_t SioSetParam(void* handle, uint32_t id, void* value) {
             return 0;  // the host's request records carry nothing this stand-in uses
         case ka::kSioHostText:
             if (source->state != State::kCreated) return kUnknownParam;
-            CopyBounded(source->userAgent, sizeof(source->userAgent),
-                        static_cast<const char*>(value));
-            return 0;
+            return CopyWhole(source->userAgent, sizeof(source->userAgent),
+                             static_cast<const char*>(value))
+                       ? 0
+                       : kUnknownParam;
         default:
             return kUnknownParam;
     }

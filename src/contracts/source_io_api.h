@@ -38,7 +38,8 @@ constexpr uint32_t kSioTotalTimeoutMs = 0x7a000002;
 // Non-zero allows file:// URLs and plain paths (default 0: http and https only).
 constexpr uint32_t kSioAllowFiles = 0x7a000003;
 // Directory (const char*, null clears) against which relative paths are read when files are
-// allowed.
+// allowed. Only files whose real path (symlinks resolved) lies inside it are read; without one
+// no file is read.
 constexpr uint32_t kSioFileBaseDir = 0x7a000004;
 // Redirects followed at most (default 5).
 constexpr uint32_t kSioMaxRedirects = 0x7a000005;
@@ -53,7 +54,7 @@ constexpr uint32_t kSioMaxBodySize = KA_DOWNLOAD_MAX_SIZE;
 // ---- Codes ----
 
 // GetSourceSize: the transfer failed (network error, HTTP status >= 400, timeout, body too
-// large, URL not allowed).
+// large, URL not allowed). Init: the URL does not fit the module's 2048 bytes; it is never cut.
 constexpr uint32_t kSioFailed = 0x91127000;
 // GetSourceSize: the body has not fully arrived yet; Read: nothing available yet.
 constexpr uint32_t kSioNotReady = 2;

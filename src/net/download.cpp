@@ -8,7 +8,7 @@
 
 #include "ka/os_utils.h"
 #include "ka/result_codes.h"
-#include "ka/uri.h"
+#include "net/uri_whole.h"
 #include "platform/lib_loader.h"
 #include "platform/limits.h"
 #include "source_io_api.h"
@@ -112,20 +112,21 @@ bool HasHostOperations(const SourceIOApi* api) {
            (api->Open == nullptr || api->Close != nullptr);
 }
 
+// Whether the record's field holds a terminated string.
+bool Terminated(const char (&field)[KA_DOWNLOAD_URL_SIZE]) {
+    return memchr(field, '\0', sizeof(field)) != nullptr;
+}
+
 // The URL to fetch into url (kUrlSize bytes): record->url, joined to record->baseURL when asked.
-void ResolveUrl(const DownloadRecord* record, KA_BOOL useBase, char* url) {
-    if (useBase != 0) {
-        char ref[ka::kUrlSize];
-        char base[ka::kUrlSize];
-        memcpy(ref, record->url, sizeof(ref));
-        memcpy(base, record->baseURL, sizeof(base));
-        ref[sizeof(ref) - 1] = '\0';
-        base[sizeof(base) - 1] = '\0';
-        CombineURL(url, ref, base);
-    } else {
+// False when a field is not terminated or the joined URL does not fit: cut, it would name some
+// other resource.
+bool ResolveUrl(const DownloadRecord* record, KA_BOOL useBase, char* url) {
+    if (!Terminated(record->url)) return false;
+    if (useBase == 0) {
         memcpy(url, record->url, ka::kUrlSize);
+        return true;
     }
-    url[ka::kUrlSize - 1] = '\0';
+    return Terminated(record->baseURL) && ka::CombineUrlWhole(url, record->url, record->baseURL);
 }
 
 // Reads size bytes into the caller's buffer (grown to three times the size when too small) or
@@ -194,9 +195,9 @@ uint32_t HostDownload(SourceIOApi* api, const HostRequest& request, DownloadReco
                               target->bytesRead == nullptr)) {
         return KA_ERR_NULL_ARGUMENT;
     }
-    char url[ka::kUrlSize] = {};
-    ResolveUrl(record, request.useBase, url);
     if (!HasHostOperations(api)) return KA_ERR_DOWNLOAD_OPEN;
+    char url[ka::kUrlSize] = {};
+    if (!ResolveUrl(record, request.useBase, url)) return KA_ERR_DOWNLOAD_FAILED;
 
     void* handle = nullptr;
     uint64_t sourceSize = 0;

@@ -6,6 +6,7 @@
 #include <cstring>
 #include <initializer_list>
 
+#include "net/uri_whole.h"
 #include "platform/limits.h"
 
 namespace {
@@ -19,16 +20,23 @@ const char* const kAbsolutePrefixes[] = {
 
 bool Present(const char* text) { return text != nullptr && text[0] != '\0'; }
 
-// Appends n bytes of src to the terminated string in dst, cutting at kMaxLength characters.
-void AppendN(char* dst, const char* src, size_t n) {
+// Appends n bytes of src to the terminated string in dst, cutting at kMaxLength characters;
+// *cut (when given) is set when something was cut.
+void AppendN(char* dst, const char* src, size_t n, bool* cut = nullptr) {
     size_t used = strnlen(dst, kMaxLength);
-    if (n > kMaxLength - used) n = kMaxLength - used;
+    if (n > kMaxLength - used) {
+        n = kMaxLength - used;
+        if (cut != nullptr) *cut = true;
+    }
     memmove(dst + used, src, n);
     dst[used + n] = '\0';
 }
 
-void Append(char* dst, const char* src) {
-    if (src != nullptr) AppendN(dst, src, strnlen(src, kMaxLength));
+void Append(char* dst, const char* src, bool* cut = nullptr) {
+    if (src == nullptr) return;
+    const size_t n = strnlen(src, kMaxLength + 1);
+    if (n > kMaxLength && cut != nullptr) *cut = true;
+    AppendN(dst, src, n > kMaxLength ? kMaxLength : n, cut);
 }
 
 // Writes n bytes of src as the whole, terminated content of dst.
@@ -48,10 +56,8 @@ size_t DirectoryLength(const char* text, size_t length) {
     return 0;
 }
 
-}  // namespace
-
-uint32_t CombineURL(char* out, char* ref, char* base) {
-    if (out == nullptr || ref == nullptr || base == nullptr) return 0;
+// CombineURL's work; *cut is set when the result did not fit.
+void Combine(char* out, const char* ref, const char* base, bool* cut) {
     out[0] = '\0';
 
     bool refAbsolute = false;
@@ -64,7 +70,7 @@ uint32_t CombineURL(char* out, char* ref, char* base) {
     if (!baseHttp) {
         // A file path base: keep its directory, whichever separator it uses.
         if (!refAbsolute && !(ref[0] == '/' && base[0] == '/')) {
-            AppendN(out, base, DirectoryLength(base, baseLength));
+            AppendN(out, base, DirectoryLength(base, baseLength), cut);
         }
     } else if (!refAbsolute) {
         if (ref[0] != '/') {
@@ -82,16 +88,35 @@ uint32_t CombineURL(char* out, char* ref, char* base) {
                     break;
                 }
             }
-            AppendN(out, base, keep);
+            AppendN(out, base, keep, cut);
         } else {
             // Origin only: the first "/" from position 8 on passes over "https://".
             const char* slash = baseLength > 8 ? strchr(base + 8, '/') : nullptr;
-            AppendN(out, base, slash != nullptr ? static_cast<size_t>(slash - base) : baseLength);
+            AppendN(out, base, slash != nullptr ? static_cast<size_t>(slash - base) : baseLength,
+                    cut);
         }
     }
-    Append(out, ref);
+    Append(out, ref, cut);
+}
+
+}  // namespace
+
+uint32_t CombineURL(char* out, char* ref, char* base) {
+    if (out == nullptr || ref == nullptr || base == nullptr) return 0;
+    Combine(out, ref, base, nullptr);
     return 0;
 }
+
+namespace ka {
+
+bool CombineUrlWhole(char* out, const char* ref, const char* base) {
+    if (out == nullptr || ref == nullptr || base == nullptr) return false;
+    bool cut = false;
+    Combine(out, ref, base, &cut);
+    return !cut;
+}
+
+}  // namespace ka
 
 uint32_t GetComponentOfURI(char* scheme, char* authority, char* path, char* query, char* fragment,
                            char* uri) {

@@ -128,7 +128,10 @@ int CCpuInfo::count_cpu_in(const char* cpuDir) {
     // Only odd numbers are probed: cores come in pairs on the devices this runs on.
     for (int n = 21; n >= 1; n -= 2) {
         char path[256];
-        snprintf(path, sizeof(path), "%s/cpu%d", cpuDir, n);
+        // A folder too long for the probe's path cannot be probed; a cut path would probe
+        // something else.
+        const int written = snprintf(path, sizeof(path), "%s/cpu%d", cpuDir, n);
+        if (written < 0 || static_cast<size_t>(written) >= sizeof(path)) return 1;
         if (access(path, F_OK) == 0) return n + 1;
     }
     return 1;

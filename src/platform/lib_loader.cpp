@@ -21,13 +21,23 @@ bool IsVariantModule(const char* path) {
     return false;
 }
 
+// Builds prefix + "lib" (unless name holds "lib") + name + ".so" (unless name holds ".so") into
+// out; false when that does not fit, and nothing of it may then be loaded.
+bool BuildModulePath(char* out, size_t size, const char* prefix, const char* name) {
+    return ka::CopyBounded(out, size, prefix) &&
+           (strstr(name, "lib") != nullptr || ka::AppendBounded(out, size, "lib")) &&
+           ka::AppendBounded(out, size, name) &&
+           (strstr(name, ".so") != nullptr || ka::AppendBounded(out, size, ".so"));
+}
+
 }  // namespace
 
 namespace ka {
 
 void ApplyCpuRecord(CLibLoader& loader, const CpuInfoRecord& info) {
     if (info.type == KA_CPU_TYPE_ARM && (info.features & KA_CPU_FEATURE_NEON) != 0) {
-        CopyBounded(loader.mLibSuffix, sizeof(loader.mLibSuffix), "_v7.so");
+        // A constant that fits the suffix array; a failed copy would leave the suffix empty.
+        (void)CopyBounded(loader.mLibSuffix, sizeof(loader.mLibSuffix), "_v7.so");
     }
     loader.mCpuCount = info.count;
 }
@@ -90,7 +100,7 @@ unsigned int CLibLoader::SetCpuCount(int count) {
 }
 
 unsigned int CLibLoader::SetCpuVersion(int version) {
-    if (version == 7) ka::CopyBounded(mLibSuffix, sizeof(mLibSuffix), "_v7.so");
+    if (version == 7) (void)ka::CopyBounded(mLibSuffix, sizeof(mLibSuffix), "_v7.so");
     return 0;
 }
 
@@ -98,20 +108,19 @@ int CLibLoader::LoadLib(void* /*unused*/) {
     if (mLibHandle != nullptr) FreeLib();
 
     char requested[ka::kModuleNameSize];
-    ka::CopyBounded(requested, sizeof(requested), mLibName);
+    if (!ka::CopyBounded(requested, sizeof(requested), mLibName)) return 0;
 
     LoadModuleService();
     if (mLoadLibrary == nullptr || mGetAddressSymbol == nullptr || mFreeLibrary == nullptr) {
         return 0;
     }
 
+    // Each name is built in full before it is tried: a name cut to fit mLibName would load some
+    // other file, so one that does not fit ends the load.
+    char name[ka::kModuleNameSize];
     if (mWorkPath != nullptr && mWorkPath[0] != '\0') {
-        ka::CopyBounded(mLibName, sizeof(mLibName), mWorkPath);
-        if (strstr(requested, "lib") == nullptr)
-            ka::AppendBounded(mLibName, sizeof(mLibName), "lib");
-        ka::AppendBounded(mLibName, sizeof(mLibName), requested);
-        if (strstr(requested, ".so") == nullptr)
-            ka::AppendBounded(mLibName, sizeof(mLibName), ".so");
+        if (!BuildModulePath(name, sizeof(name), mWorkPath, requested)) return 0;
+        memcpy(mLibName, name, strlen(name) + 1);
         mLibHandle = LoadVariantLib(mLibName);
         if (mLibHandle == nullptr) mLibHandle = mLoadLibrary(mLibName, ka::kModuleLoadNow);
         if (mLibHandle == nullptr) return 0;
@@ -120,8 +129,11 @@ int CLibLoader::LoadLib(void* /*unused*/) {
         const bool isPath = strchr(requested, '/') != nullptr;
         const char* const prefixes[] = {"", "lib", "/system/lib/", "/system/lib/lib"};
         for (const char* prefix : prefixes) {
-            ka::CopyBounded(mLibName, sizeof(mLibName), prefix);
-            ka::AppendBounded(mLibName, sizeof(mLibName), requested);
+            if (!ka::CopyBounded(name, sizeof(name), prefix) ||
+                !ka::AppendBounded(name, sizeof(name), requested)) {
+                break;
+            }
+            memcpy(mLibName, name, strlen(name) + 1);
             mLibHandle = mLoadLibrary(mLibName, ka::kModuleLoadNow);
             if (mLibHandle != nullptr || isPath) break;
         }
@@ -143,19 +155,20 @@ int CLibLoader::FreeLib() {
 void* CLibLoader::LoadVariantLib(char* path) {
     if (mLibSuffix[0] == '\0' || path == nullptr) return nullptr;
 
+    // A variant name that does not fit is not tried; the caller then loads the plain one.
     char variant[ka::kModuleNameSize];
-    ka::CopyBounded(variant, sizeof(variant), path);
+    if (!ka::CopyBounded(variant, sizeof(variant), path)) return nullptr;
     char* so = strstr(variant, ".so");
     if (so == nullptr) return nullptr;
     if (IsVariantModule(variant)) {
         *so = '\0';
-        ka::AppendBounded(variant, sizeof(variant), mLibSuffix);
+        if (!ka::AppendBounded(variant, sizeof(variant), mLibSuffix)) return nullptr;
     }
 
     LoadModuleService();
     if (mLoadLibrary == nullptr) return nullptr;
     void* handle = mLoadLibrary(variant, ka::kModuleLoadNow);
-    if (handle != nullptr) ka::CopyBounded(mLibName, sizeof(mLibName), variant);
+    if (handle != nullptr) memcpy(mLibName, variant, strlen(variant) + 1);
     return handle;
 }
 
@@ -164,9 +177,12 @@ int CLibLoader::LoadModuleService() {
         return 1;
     }
     if (mServiceHandle == nullptr) {
+        // A working path too long for the service's name opens nothing rather than a cut path.
         char path[ka::kModuleNameSize] = {};
-        ka::CopyBounded(path, sizeof(path), mWorkPath);
-        ka::AppendBounded(path, sizeof(path), "libkadl.so");
+        if (!ka::CopyBounded(path, sizeof(path), mWorkPath) ||
+            !ka::AppendBounded(path, sizeof(path), "libkadl.so")) {
+            return 0;
+        }
         mServiceHandle = dlopen(path, RTLD_NOW);
         if (mServiceHandle == nullptr) return 0;
     }

@@ -23,11 +23,12 @@ unsigned int CXMLDocument::InitXMLParser() {
     // A second Init first undoes the first one.
     UninitXMLParser();
 
-    ka::CopyBounded(mLibName, sizeof(mLibName), kModuleName);
-    ka::AppendBounded(mLibName, sizeof(mLibName), kModuleExtension);
-    ka::CopyBounded(mEntryName, sizeof(mEntryName), kEntryName);
-
-    if (LoadLib(nullptr) == 0 || mEntry == nullptr) return KA_ERR_MODULE_NOT_LOADED;
+    if (!ka::CopyBounded(mLibName, sizeof(mLibName), kModuleName) ||
+        !ka::AppendBounded(mLibName, sizeof(mLibName), kModuleExtension) ||
+        !ka::CopyBounded(mEntryName, sizeof(mEntryName), kEntryName) || LoadLib(nullptr) == 0 ||
+        mEntry == nullptr) {
+        return KA_ERR_MODULE_NOT_LOADED;
+    }
     // Called through the entry's own type: the loader keeps it as a generic pointer.
     reinterpret_cast<KaXMLGetParserAPIFn>(mEntry)(&mXMLAPI);
     if (mXMLAPI.Init == nullptr) return KA_ERR_MODULE_NOT_LOADED;

@@ -50,20 +50,34 @@ TEST(ApiTable, NullHandleInEverySlotButOpen) {
 }
 
 TEST(ApiTable, OpenWithoutXmlModuleLeavesHandleUntouched) {
-    // A folder with no module at all, then one with the loader but no XML module.
     char pattern[] = "/tmp/ka_vmap_api_XXXXXX";
     ASSERT_NE(mkdtemp(pattern), nullptr);
-    std::string dir = std::string(pattern) + "/";
-    const std::string kadl = std::string(KA_MODULES_DIR) + "libkadl.so";
-    for (bool withLoader : {false, true}) {
-        if (withLoader) {
-            ASSERT_EQ(symlink(kadl.c_str(), (dir + "libkadl.so").c_str()), 0);
+    const std::string dir = std::string(pattern) + "/";
+    // A working path with room for libkadl.so but not for libkaXMLParser.so; the module's name cut
+    // to fit it is made to lead to the real module.
+    const std::string padded = dir + std::string(243 - dir.size(), '/');
+    const std::string cut = (padded + "libkaXMLParser.so").substr(0, 255).substr(padded.size());
+    // {a link the folder gains (name, module it leads to), the working path}: a folder with no
+    // module at all, one with the loader but no XML module, a working path too long.
+    const struct {
+        std::string link, module, workPath;
+    } cases[] = {
+        {"", "", dir}, {"libkadl.so", "libkadl.so", dir}, {cut, "libkaXMLParser.so", padded}};
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.link);
+        if (!c.link.empty()) {
+            const std::string module = std::string(KA_MODULES_DIR) + c.module;
+            ASSERT_EQ(symlink(module.c_str(), (dir + c.link).c_str()), 0);
         }
+        std::string workPath = c.workPath;
         void* handle = kUntouched;
-        EXPECT_EQ(Api().Open(&handle, &dir[0]), KA_ERR_MODULE_NOT_LOADED) << withLoader;
-        EXPECT_EQ(handle, kUntouched) << withLoader;
+        EXPECT_EQ(Api().Open(&handle, &workPath[0]), KA_ERR_MODULE_NOT_LOADED);
+        EXPECT_EQ(handle, kUntouched);
+        if (handle != kUntouched && handle != nullptr) Api().Close(handle);
     }
-    unlink((dir + "libkadl.so").c_str());
+    for (const auto& c : cases) {
+        if (!c.link.empty()) unlink((dir + c.link).c_str());
+    }
     rmdir(pattern);
 }
 

@@ -5,6 +5,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <string>
 
 #include "api_support.h"
@@ -98,6 +99,11 @@ TEST(Kavmap, PrintsTheExpectedLines) {
          {"ad 1: id outer, sequence 0, Wrapper\n",
           "  wrapped document:\n    VAST: 1 ads, depth 1, error URL -\n"
           "    ad 1: id wrapped, sequence 0, InLine\n"}},
+        // Control bytes of the document show escaped; none reaches the terminal.
+        {"--vast " + Data("documents/vast/raw_bytes.xml"),
+         {"ad 1: id \\x1b[31mred\\x1b[0m, sequence 0, InLine\n",
+          "  ad system: bell\\x07 escape\\x1b]0;title\\x07 del\\x7f c1\\xc2\\x9b end\n",
+          "  impression: http://imp.test/\\x1b[2J\\x08?q="}},
         // clang-format on
     };
     for (const auto& c : kCases) {
@@ -105,6 +111,10 @@ TEST(Kavmap, PrintsTheExpectedLines) {
         const RunResult run = RunKavmap(c.args);
         EXPECT_EQ(run.status, 0) << run.err;
         for (const char* line : c.lines) EXPECT_NE(run.out.find(line), std::string::npos) << line;
+        const auto raw = std::find_if(run.out.begin(), run.out.end(), [](unsigned char b) {
+            return (b < 0x20 && b != '\n') || b == 0x7f;
+        });
+        EXPECT_TRUE(raw == run.out.end()) << "a raw control byte at " << raw - run.out.begin();
     }
 }
 

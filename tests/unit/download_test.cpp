@@ -3,9 +3,11 @@
 #include "ka/download.h"
 
 #include <gtest/gtest.h>
+#include <stdlib.h>
 
 #include <chrono>
 #include <cstdio>
+#include <filesystem>
 #include <fstream>
 #include <memory>
 #include <string>
@@ -19,9 +21,9 @@
 
 namespace {
 
+namespace fs = std::filesystem;
 using Clock = std::chrono::steady_clock;
 using loopback::SetModule;
-using Strings = std::vector<std::string>;
 
 int64_t MsSince(Clock::time_point from) {
     return std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - from).count();
@@ -128,6 +130,9 @@ protected:
 TEST_F(DownloadTest, ByUrl) {
     // Failures before the read stage give no buffer; once there, a buffer comes back.
     const std::string none = "<none>", big = std::to_string(ka::kSioMaxBodySize + 1);
+    // URLs of 2047 characters (the longest that fits) and 2048, which cut would be the first.
+    const std::string name(KA_DOWNLOAD_URL_SIZE - 1 - server_.Url("/d/").size(), 'n');
+    const std::string fits = server_.Put(name, "fits"), over = server_.Put(name + "n", "over");
     const struct {
         std::string url;
         KA_BOOL stop;
@@ -143,12 +148,14 @@ TEST_F(DownloadTest, ByUrl) {
         {server_.Url("/size/" + big), 0, KA_ERR_DOWNLOAD_FAILED, none},
         {server_.Url("/stall"), 0, KA_ERR_DOWNLOAD_FAILED, none, 300},
         {server_.Url("/d/doc"), 0, KA_ERR_LOAD_FAILED, none, 0, KA_TEST_DATA_DIR "net/"},
+        {fits, 0, 0, "fits"},
+        {over, 0, KA_ERR_DOWNLOAD_FAILED, none},
         // Stopped with no size known: a zero-length buffer. 2 stops as 1 does but reads as success.
         {server_.Url("/stall"), 1, KA_ERR_DOWNLOAD_FAILED, ""},
         {server_.Url("/stall"), 2, 0, ""},
     };
     for (const auto& c : cases) {
-        SCOPED_TRACE(c.url + " stop " + std::to_string(c.stop) + " " + c.workPath);
+        SCOPED_TRACE(c.url.substr(0, 80) + " stop " + std::to_string(c.stop) + " " + c.workPath);
         SetModule(ka::kSioTotalTimeoutMs, c.totalTimeoutMs);
         KA_BOOL stop = c.stop;
         Fetched r = Fetch(c.url, &stop, c.workPath);
@@ -166,28 +173,65 @@ TEST_F(DownloadTest, ByUrl) {
 }
 
 TEST_F(DownloadTest, FilesOnlyWhenEnabledAndInsideTheBase) {
-    std::ifstream in(kLocal, std::ios::binary);
-    const std::string local((std::istreambuf_iterator<char>(in)), {});
+    // base/ holds the document, a symlink to it and a symlink leading out; base2/ shares the
+    // base's name as a prefix.
+    char pattern[] = "/tmp/ka_sio_XXXXXX";
+    ASSERT_NE(mkdtemp(pattern), nullptr);
+    const std::string tmp = pattern, base = tmp + "/base", in = base + "/local_document.xml";
+    fs::create_directories(base);
+    fs::create_directories(tmp + "/base2");
+    fs::copy_file(kLocal, in);
+    fs::copy_file(kLocal, tmp + "/base2/local_document.xml");
+    fs::copy_file(kLocal, tmp + "/outside.xml");
+    fs::create_symlink("local_document.xml", base + "/alias.xml");
+    fs::create_symlink(tmp + "/outside.xml", base + "/escape.xml");
+    std::ifstream stream(kLocal, std::ios::binary);
+    const std::string local((std::istreambuf_iterator<char>(stream)), {});
     ASSERT_FALSE(local.empty());
-    const std::string file = "file://" + kLocal, toFile = server_.Url("/redirect?to=" + file);
+    const std::string toFile = server_.Url("/redirect?to=file://" + in);
+    // {URL, read when files are allowed}
+    const struct {
+        std::string url;
+        bool readable;
+    } cases[] = {{"file://" + in, true},
+                 {"file://localhost" + in, true},
+                 {in, true},
+                 {"local_document.xml", true},
+                 {"alias.xml", true},  // a symlink that stays inside
+                 // Outside the base: absolute, as a file URL, climbing out, through a symlink, in a
+                 // sibling whose name starts with the base's.
+                 {tmp + "/outside.xml", false},
+                 {"file://" + tmp + "/outside.xml", false},
+                 {"file://" + base + "/../outside.xml", false},
+                 {"escape.xml", false},
+                 {tmp + "/base2/local_document.xml", false},
+                 {kLocal, false},
+                 // Relative references never climb; only regular files; no redirect to a file.
+                 {"../base/local_document.xml", false},
+                 {"x/../../base/local_document.xml", false},
+                 {"net/x.xml", false},
+                 {"missing.xml", false},
+                 {"file://relative.xml", false},
+                 {"/dev/zero", false},
+                 {base, false},
+                 {toFile, false},
+                 {"data:,abc", false},
+                 {"", false},
+                 {"ftp://127.0.0.1:1/x", false},
+                 {"gopher://127.0.0.1:1/", false},
+                 {"dict://127.0.0.1:1/x", false}};
     for (bool allowed : {false, true}) {
         SetModule(ka::kSioAllowFiles, allowed);
         api_.SetParam(nullptr, ka::kSioFileBaseDir,
-                      allowed ? const_cast<char*>(KA_TEST_DATA_DIR "net") : nullptr);
-        // Relative references stay inside the base; only regular files; no redirect to a file.
-        for (const std::string& url :
-             Strings{file, "file://localhost" + kLocal, kLocal, "local_document.xml", "net/x.xml",
-                     "data:,abc", "", "ftp://127.0.0.1:1/x", "gopher://127.0.0.1:1/",
-                     "dict://127.0.0.1:1/x", "../net/local_document.xml",
-                     "x/../../net/local_document.xml", "missing.xml", "file://relative.xml",
-                     "/dev/zero", KA_TEST_DATA_DIR "net", toFile}) {
-            const bool readable = allowed && url.find("local_document") != std::string::npos &&
-                                  url.find("..") == std::string::npos && url != toFile;
-            Fetched r = Fetch(url);
-            EXPECT_EQ(readable ? 0u : KA_ERR_DOWNLOAD_FAILED, r.code) << url << " " << allowed;
-            EXPECT_TRUE(!readable || local == r.text) << url;
+                      allowed ? const_cast<char*>(base.c_str()) : nullptr);
+        for (const auto& c : cases) {
+            const bool readable = allowed && c.readable;
+            Fetched r = Fetch(c.url);
+            EXPECT_EQ(readable ? 0u : KA_ERR_DOWNLOAD_FAILED, r.code) << c.url << " " << allowed;
+            EXPECT_TRUE(!readable || local == r.text) << c.url;
         }
     }
+    fs::remove_all(tmp);
 }
 
 TEST_F(DownloadTest, ToBufferReportsTheFinalUrlKeepsItsBufferAndJoinsTheBase) {
@@ -218,6 +262,16 @@ TEST_F(DownloadTest, ToBufferReportsTheFinalUrlKeepsItsBufferAndJoinsTheBase) {
     EXPECT_EQ(server_.Url("/d/dir/doc"), call.record->finalURL);
     // Without the base the reference is used as given, and "doc" is no URL of the module.
     EXPECT_EQ(KA_ERR_DOWNLOAD_FAILED, call.Run(&api_, "doc", nullptr, 0));
+
+    // A reference that, joined to its base, takes 2048 characters fails; cut, it would be the
+    // 2047-character URL that the reference one character shorter reaches.
+    const std::string dir(1900, 'd'), prefix = server_.Url("/d/" + dir + "/");
+    const std::string ref(KA_DOWNLOAD_URL_SIZE - prefix.size(), 'r');
+    server_.Put(dir + "/" + ref.substr(1), "fits");
+    snprintf(call.record->baseURL, KA_DOWNLOAD_URL_SIZE, "%s", (prefix + "index.xml").c_str());
+    EXPECT_EQ(KA_ERR_DOWNLOAD_FAILED, call.Run(&api_, ref, nullptr, 1));
+    EXPECT_EQ(0u, call.Run(&api_, ref.substr(1), nullptr, 1));
+    EXPECT_EQ("fits", call.Text());
 }
 
 TEST_F(DownloadTest, ToBufferLimitsAndFailures) {

@@ -125,14 +125,35 @@ TEST_F(LibLoaderTest, IncompleteOrMissingServiceLoadsNothing) {
     }
 }
 
-TEST_F(LibLoaderTest, OverlongNamesStayInTheirBuffers) {
-    std::string longPath = "/" + std::string(400, 'd') + "/",
-                longName(sizeof(CLibLoader::mLibName) - 1, 'n');
-    CLibLoader loader;
-    loader.SetWorkPath(longPath.data());
-    Prepare(loader, longName.c_str(), "", false);
-    EXPECT_EQ(loader.LoadLib(nullptr), 0);
-    EXPECT_LT(strnlen(loader.mLibName, sizeof(loader.mLibName)), sizeof(loader.mLibName));
+// A name that does not fit mLibName is never asked for cut short: the search ends there. The
+// working paths are the fake's folder padded with slashes to a length.
+TEST_F(LibLoaderTest, NamesThatDoNotFitAreNeverAsked) {
+    const std::string n250(250, 'n');
+    // {working path length (0: none), requested, CPU version, the names asked for after the path}
+    // clang-format off
+    const struct { size_t length; std::string requested; int cpuVersion; std::vector<std::string> asks; } cases[] = {
+        {243, "kaSourceIO", 0, {}},  // libkadl.so fits, libkaSourceIO.so does not
+        {240, "kaVidDec", 7, {"libkaVidDec.so"}},  // the plain name fits, its "_v7.so" variant not
+        {0, n250, 0, {n250, "lib" + n250}},  // "/system/lib/" candidates do not fit
+        {400, "kaSourceIO", 0, {}},  // not even libkadl.so fits
+    };
+    // clang-format on
+    for (const auto& c : cases) {
+        SCOPED_TRACE(std::to_string(c.length) + " " + c.requested);
+        SetUp();
+        ASSERT_LT(kFakeDir.size(), c.length == 0 ? 256 : c.length);
+        std::string path =
+            c.length == 0 ? "" : kFakeDir + std::string(c.length - kFakeDir.size(), '/');
+        std::string expected;
+        for (const std::string& name : c.asks) expected += "load:" + path + name + " ";
+        CLibLoader loader;
+        loader.SetWorkPath(c.length == 0 ? nullptr : &path[0]);
+        Prepare(loader, c.requested.c_str(), kEntry, false);
+        loader.SetCpuVersion(c.cpuVersion);
+        EXPECT_EQ(loader.LoadLib(nullptr), 0);
+        EXPECT_EQ(Log(), expected);
+        EXPECT_LT(strnlen(loader.mLibName, sizeof(loader.mLibName)), sizeof(loader.mLibName));
+    }
 }
 
 TEST(ModuleFunctions, WrapTheDynamicLoader) {

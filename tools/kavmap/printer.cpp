@@ -1,6 +1,7 @@
 #include "printer.h"
 
 #include <cinttypes>
+#include <cstdlib>
 
 #include "ka/result_codes.h"
 
@@ -226,14 +227,62 @@ void PrintVast(FILE* out, int level, const VastAdData& data, const ProcessResult
     });
 }
 
-// JSON strings: quotes, backslashes and control characters escaped, other bytes as they are.
+// Length of the well-formed UTF-8 sequence at p (1 to 4), or 0 when the bytes there are not one;
+// *bad then holds how many bytes make up the broken part (at least 1), all of which one U+FFFD
+// replaces. Overlong forms, surrogates and code points above U+10FFFF are not well-formed.
+size_t Utf8Sequence(const unsigned char* p, size_t* bad) {
+    const unsigned char lead = p[0];
+    size_t length = 0;
+    unsigned char low = 0x80;  // the range the second byte must lie in
+    unsigned char high = 0xbf;
+    if (lead < 0x80) return 1;
+    if (lead >= 0xc2 && lead <= 0xdf) {
+        length = 2;
+    } else if (lead >= 0xe0 && lead <= 0xef) {
+        length = 3;
+        if (lead == 0xe0) low = 0xa0;   // overlong below U+0800
+        if (lead == 0xed) high = 0x9f;  // surrogates
+    } else if (lead >= 0xf0 && lead <= 0xf4) {
+        length = 4;
+        if (lead == 0xf0) low = 0x90;   // overlong below U+10000
+        if (lead == 0xf4) high = 0x8f;  // above U+10FFFF
+    } else {
+        *bad = 1;
+        return 0;
+    }
+    for (size_t i = 1; i < length; ++i) {
+        const unsigned char lowest = i == 1 ? low : 0x80;
+        const unsigned char highest = i == 1 ? high : 0xbf;
+        if (p[i] < lowest || p[i] > highest) {  // the terminator ends a sequence here too
+            *bad = i;
+            return 0;
+        }
+    }
+    return length;
+}
+
+// JSON strings: quotes, backslashes and control characters escaped, well-formed UTF-8 as it is,
+// and each broken UTF-8 sequence replaced by U+FFFD, so that the output is valid JSON whatever
+// bytes the document held.
 void JsonString(FILE* out, const char* text) {
     if (text == nullptr) {
         fputs("null", out);
         return;
     }
     fputc('"', out);
-    for (const unsigned char* p = reinterpret_cast<const unsigned char*>(text); *p; ++p) {
+    for (const unsigned char* p = reinterpret_cast<const unsigned char*>(text); *p;) {
+        size_t bad = 0;
+        const size_t length = Utf8Sequence(p, &bad);
+        if (length == 0) {
+            fputs("\xef\xbf\xbd", out);  // U+FFFD
+            p += bad;
+            continue;
+        }
+        if (length > 1) {
+            fwrite(p, 1, length, out);
+            p += length;
+            continue;
+        }
         switch (*p) {
             case '"':
                 fputs("\\\"", out);
@@ -257,6 +306,7 @@ void JsonString(FILE* out, const char* text) {
                     fputc(*p, out);
                 }
         }
+        ++p;
     }
     fputc('"', out);
 }
@@ -547,9 +597,8 @@ void JsonBreak(FILE* out, const AdBreak& adBreak, const ProcessResult& result) {
     fputs(adBreak.trackings != nullptr ? "\n      ]\n    }" : "]\n    }", out);
 }
 
-}  // namespace
-
-void PrintText(FILE* out, const ProcessResult& result) {
+// The readable tree, document strings as they are.
+void PrintTree(FILE* out, const ProcessResult& result) {
     if (result.contentUri != nullptr) fprintf(out, "content URI: %s\n", result.contentUri);
     const AdInfo* info = result.adInfo;
     const uint32_t count = info != nullptr ? info->adBreakCount : 0;
@@ -590,6 +639,40 @@ void PrintText(FILE* out, const ProcessResult& result) {
     // After a VMAP document the handle's container repeats the last inline VAST document.
     if (!result.vastOnly) fputs("handle's VAST container (the last inline document):\n", out);
     PrintVast(out, result.vastOnly ? 0 : 1, *result.vastAdData, result, 0);
+}
+
+// Writes text to out with the control characters a terminal would act on shown as \xNN instead:
+// C0 controls but the line break, DEL, and C1 controls encoded in UTF-8.
+void WriteVisible(FILE* out, const char* text, size_t size) {
+    const unsigned char* p = reinterpret_cast<const unsigned char*>(text);
+    for (size_t i = 0; i < size; ++i) {
+        const bool c1 = p[i] == 0xc2 && i + 1 < size && p[i + 1] >= 0x80 && p[i + 1] <= 0x9f;
+        if ((p[i] < 0x20 && p[i] != '\n') || p[i] == 0x7f) {
+            fprintf(out, "\\x%02x", p[i]);
+        } else if (c1) {
+            fprintf(out, "\\x%02x\\x%02x", p[i], p[i + 1]);
+            ++i;
+        } else {
+            fputc(p[i], out);
+        }
+    }
+}
+
+}  // namespace
+
+void PrintText(FILE* out, const ProcessResult& result) {
+    // The tree goes to memory first so that every document string it holds passes the filter.
+    char* text = nullptr;
+    size_t size = 0;
+    FILE* memory = open_memstream(&text, &size);
+    if (memory == nullptr) {
+        fputs("(out of memory)\n", out);
+        return;
+    }
+    PrintTree(memory, result);
+    fclose(memory);
+    WriteVisible(out, text, size);
+    free(text);
 }
 
 void PrintJson(FILE* out, const ProcessResult& result) {
