@@ -52,8 +52,8 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     ka::DocumentFetch fetch = {budget.fetchBytesLeft, budget.deadline, {}, false};
     const uint32_t downloaded =
         ka::DownloadDocument(url, &buffer, &size, chain.workPath, stopFlag, &fetch);
-    // What is left of the byte budget would not hold a document of the size ad servers send:
-    // the later wrappers are not fetched at all.
+    // A document larger than what is left spends the byte budget: later wrappers are not
+    // fetched, rather than downloaded only to be dropped.
     if (fetch.overLimit) budget.fetchBytesLeft = 0;
     if (downloaded != 0 || size == 0 || buffer == nullptr) {
         delete[] buffer;
