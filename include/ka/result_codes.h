@@ -16,5 +16,13 @@
 #define KA_ERR_DOWNLOAD_FAILED 0x91127000u
 /* The source-IO table lacks Init or Open, or Init gave no handle. */
 #define KA_ERR_DOWNLOAD_OPEN 0x91127002u
+/* Memory ran out inside the library. The call did nothing lasting: a Process releases whatever
+ * it had built (the handle then holds no records, as after a failed load, and keeps its
+ * parameters), Open leaves *handle untouched, SetParam keeps the earlier value. The handle stays
+ * usable; a later Process may succeed. */
+#define KA_ERR_NO_MEMORY 0x91001002u
+/* A C++ exception other than an allocation failure reached the public table, such as one thrown
+ * by a host's extension parser; the handle is left as after KA_ERR_NO_MEMORY. */
+#define KA_ERR_INTERNAL 0x91001003u
 
 #endif /* KA_RESULT_CODES_H */

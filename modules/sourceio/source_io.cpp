@@ -42,8 +42,16 @@ struct Settings {
 std::mutex gSettingsMutex;
 Settings gSettings;
 
-std::once_flag gCurlOnce;
+// libcurl's process-wide state. An init that failed (memory ran out) is tried again by the next
+// transfer instead of leaving the module without http for good.
+std::mutex gCurlMutex;
 bool gCurlReady = false;
+
+bool CurlReady() {
+    std::lock_guard<std::mutex> lock(gCurlMutex);
+    if (!gCurlReady) gCurlReady = curl_global_init(CURL_GLOBAL_DEFAULT) == CURLE_OK;
+    return gCurlReady;
+}
 
 enum class State { kCreated, kRunning, kDone, kFailed };
 
@@ -210,7 +218,7 @@ bool ReadFile(Source* source, const char* path) {
 }
 
 bool StartTransfer(Source* source) {
-    if (!gCurlReady) return false;
+    if (!CurlReady()) return false;
     source->easy = curl_easy_init();
     source->multi = curl_multi_init();
     if (source->easy == nullptr || source->multi == nullptr) return false;
@@ -475,10 +483,9 @@ uint32_t SioSetParam(void* handle, uint32_t id, void* value) {
 
 KA_SOURCEIO_API int kaGetSourceIOAPI(SourceIOApi* api) {
     if (api == nullptr) return -1;
-    // libcurl keeps process-wide state; the module is never unloaded (-z nodelete), so once
-    // is enough.
-    std::call_once(gCurlOnce,
-                   [] { gCurlReady = curl_global_init(CURL_GLOBAL_DEFAULT) == CURLE_OK; });
+    // libcurl keeps process-wide state; the module is never unloaded (-z nodelete), so it is
+    // set up once, before any transfer.
+    CurlReady();
     api->Init = SioInit;
     api->Uninit = SioUninit;
     api->Open = SioOpen;

@@ -325,7 +325,7 @@ uint32_t DownloadDocument(char* url, unsigned char** data, uint32_t* size, char*
         uint32_t count = static_cast<uint32_t>(sourceSize);
         uint8_t* buffer = new (std::nothrow) uint8_t[count];
         if (buffer == nullptr) {
-            result = KA_ERR_LOAD_FAILED;
+            result = KA_ERR_NO_MEMORY;
         } else {
             memset(buffer, 0, count);
             *data = buffer;

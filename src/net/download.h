@@ -12,7 +12,8 @@
 // Fetches url (handed to the module unchanged) with the module found in workPath (may be null).
 // Once the read stage is reached, *data holds a buffer from array new (owned by the caller, also
 // on failure) and *size the bytes read; earlier failures leave both untouched. stopFlag may be
-// null; a flag set by another thread ends the waiting. 0 on success.
+// null; a flag set by another thread ends the waiting. 0 on success; KA_ERR_NO_MEMORY when
+// the buffer cannot be had (nothing is thrown).
 uint32_t ka_download_by_url(char* url, unsigned char** data, uint32_t* size, char* workPath,
                             KA_BOOL* stopFlag);
 

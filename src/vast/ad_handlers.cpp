@@ -1,5 +1,6 @@
 // Handlers of the document, <Ad>, <InLine> and <Wrapper> levels.
 #include <cstdlib>
+#include <memory>
 
 #include "ka/result_codes.h"
 #include "ka/vast_extension.h"
@@ -59,15 +60,13 @@ namespace {
 // Element text of an <Impression> appended to list; empty texts add no node.
 void AppendImpression(CXMLDocument& doc, void* node, AdImpression** list,
                       ka::ListTail<AdImpression>& tail) {
-    char* url = nullptr;
-    doc.GetElementText(node, url);
-    if (url == nullptr) return;
-    if (url[0] == '\0') {
-        delete[] url;
-        return;
-    }
+    char* text = nullptr;
+    doc.GetElementText(node, text);
+    // Held until the node that takes it exists: that allocation may fail.
+    std::unique_ptr<char[]> url(text);
+    if (url == nullptr || url[0] == '\0') return;
     AdImpression* impression = new AdImpression();
-    impression->url = url;
+    impression->url = url.release();
     tail.Append(list, impression);
 }
 

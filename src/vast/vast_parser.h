@@ -96,11 +96,14 @@ public:
     // clicks and tracking events to those of inlineCreative (both Linear) and sets their counts
     // to the list lengths.
     unsigned int MergeLinear(AdCreative* wrapperCreative, AdCreative* inlineCreative);
-    // Deep copies in list order, each node and string newly allocated; null for a null list.
-    // Past the Process's share of merge copies (ka::ChainBudget) a list is copied only in part.
-    AdImpression* CopyImpressionList(AdImpression* list);
-    AdClick* CopyClickList(AdClick* list);
-    AdTracking* CopyTrackingList(AdTracking* list);
+    // Appends deep copies of list, in list order, at end (each node and string newly
+    // allocated), writing end's count into count after each node: a list whose releases go by
+    // its count never holds a node past it. Past the Process's share of merge copies
+    // (ka::ChainBudget) a list is copied only in part. list must not be the target list.
+    void CopyImpressionList(const AdImpression* list, ka::ListEnd<AdImpression>& end,
+                            uint32_t& count);
+    void CopyClickList(const AdClick* list, ka::ListEnd<AdClick>& end, uint32_t& count);
+    void CopyTrackingList(const AdTracking* list, ka::ListEnd<AdTracking>& end, uint32_t& count);
 
     // Releases (vast_release.cpp): forward to the functions of vast_release.h, which free
     // everything below the record, null what they freed, accept null and always return 0.

@@ -4,6 +4,8 @@
 // an InLine ends with its own tracking, then its nearest wrapper's, then each outer one's.
 #include <cstdint>
 #include <cstring>
+#include <memory>
+#include <new>
 #include <vector>
 
 #include "ka/result_codes.h"
@@ -52,13 +54,14 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     ka::DocumentFetch fetch = {budget.fetchBytesLeft, budget.deadline, {}, false};
     const uint32_t downloaded =
         ka::DownloadDocument(url, &buffer, &size, chain.workPath, stopFlag, &fetch);
+    // Owned from here on: the allocations below may fail.
+    std::unique_ptr<unsigned char[]> owned(buffer);
+    // Memory that ran out fails the whole Process, not just this wrapper.
+    if (downloaded == KA_ERR_NO_MEMORY) throw std::bad_alloc();
     // A document larger than what is left spends the byte budget: later wrappers are not
     // fetched, rather than downloaded only to be dropped.
     if (fetch.overLimit) budget.fetchBytesLeft = 0;
-    if (downloaded != 0 || size == 0 || buffer == nullptr) {
-        delete[] buffer;
-        return KA_ERR_LOAD_FAILED;
-    }
+    if (downloaded != 0 || size == 0 || buffer == nullptr) return KA_ERR_LOAD_FAILED;
     budget.fetchBytesLeft -= size;
 
     CVASTParser* nested = new CVASTParser();
@@ -73,7 +76,7 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     inner.documentUrl = fetch.finalUrl[0] != '\0' ? fetch.finalUrl : url;
     const unsigned int result = nested->ProcessInChain(buffer, size, inner);
     chain.fetchesLeft = inner.fetchesLeft;
-    delete[] buffer;
+    owned.reset();
     nested->Close();
     return result;
 }
@@ -117,7 +120,7 @@ unsigned int CVASTParser::MergeWrapper(AdData* ad) {
             // Only the first ad survives the merge, so only it receives the wrapper's tracking.
             AdInLine* inLine = static_cast<AdInLine*>(inner->body);
             ka::ListEnd<AdImpression> end = ka::FindEnd(&inLine->impressions);
-            ka::Attach(end, CopyImpressionList(wrapper->impressions));
+            CopyImpressionList(wrapper->impressions, end, inLine->impressionCount);
             inLine->impressionCount = end.count;
             MergeCreatives(wrapper, inLine->creatives);
         }
@@ -195,11 +198,11 @@ void CVASTParser::AppendLinearTracking(AdLinear* target, AdLinear* const* source
             const AdVideoClicks* u = sources[i]->videoClicks;
             if (u == nullptr) continue;
             if (u->clickTrackings != nullptr) {
-                ka::Attach(trackings, CopyClickList(u->clickTrackings));
+                CopyClickList(u->clickTrackings, trackings, v->clickTrackingCount);
                 trackingsCopied = true;
             }
             if (u->customClicks != nullptr) {
-                ka::Attach(customs, CopyClickList(u->customClicks));
+                CopyClickList(u->customClicks, customs, v->customClickCount);
                 customsCopied = true;
             }
         }
@@ -210,52 +213,41 @@ void CVASTParser::AppendLinearTracking(AdLinear* target, AdLinear* const* source
     }
     ka::ListEnd<AdTracking> events = ka::FindEnd(&target->trackingEvents);
     for (size_t i = 0; i < count; ++i) {
-        ka::Attach(events, CopyTrackingList(sources[i]->trackingEvents));
+        CopyTrackingList(sources[i]->trackingEvents, events, target->trackingCount);
     }
     target->trackingCount = events.count;
 }
 
-AdImpression* CVASTParser::CopyImpressionList(AdImpression* list) {
-    AdImpression* head = nullptr;
-    AdImpression** link = &head;
+// Each copy is linked in and counted before its strings are copied: when an allocation fails,
+// the list holds only nodes the releases reach and free.
+void CVASTParser::CopyImpressionList(const AdImpression* list, ka::ListEnd<AdImpression>& end,
+                                     uint32_t& count) {
     for (; list != nullptr; list = list->next) {
         if (!TakeCopy(sizeof(AdImpression), list->url)) break;
-        AdImpression* copy = new AdImpression();
+        AdImpression* copy = ka::Link(end, new AdImpression(), count);
         copy->url = ka::CopyString(list->url);
-        *link = copy;
-        link = &copy->next;
     }
-    return head;
 }
 
-AdClick* CVASTParser::CopyClickList(AdClick* list) {
-    AdClick* head = nullptr;
-    AdClick** link = &head;
+void CVASTParser::CopyClickList(const AdClick* list, ka::ListEnd<AdClick>& end, uint32_t& count) {
     for (; list != nullptr; list = list->next) {
         if (!TakeCopy(sizeof(AdClick) + ka::CopySize(list->id), list->url)) break;
-        AdClick* copy = new AdClick();
+        AdClick* copy = ka::Link(end, new AdClick(), count);
         copy->id = ka::CopyString(list->id);
         copy->url = ka::CopyString(list->url);
-        *link = copy;
-        link = &copy->next;
     }
-    return head;
 }
 
-AdTracking* CVASTParser::CopyTrackingList(AdTracking* list) {
-    AdTracking* head = nullptr;
-    AdTracking** link = &head;
+void CVASTParser::CopyTrackingList(const AdTracking* list, ka::ListEnd<AdTracking>& end,
+                                   uint32_t& count) {
     for (; list != nullptr; list = list->next) {
         if (!TakeCopy(sizeof(AdTracking) + ka::CopySize(list->event), list->url)) break;
-        AdTracking* copy = new AdTracking();
+        AdTracking* copy = ka::Link(end, new AdTracking(), count);
         copy->event = ka::CopyString(list->event);
         copy->offsetKind = list->offsetKind;
         copy->offset = list->offset;
         copy->url = ka::CopyString(list->url);
-        *link = copy;
-        link = &copy->next;
     }
-    return head;
 }
 
 bool CVASTParser::TakeCopy(size_t recordBytes, const char* text) {

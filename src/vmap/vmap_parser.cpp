@@ -231,7 +231,13 @@ unsigned int CVMAPParser::LoadVASTAdData(void* node, VastAdData* block) {
     // The container's previous content belongs to the ad source that copied it.
     mVastParser->ForgetVastAdData();
     // The document stays this handle's: the VAST parser walks the node without closing it.
-    mVastParser->ParseVASTNodeInChain(vast, false, mMergeWrappers != 0, mInlineChain);
+    try {
+        mVastParser->ParseVASTNodeInChain(vast, false, mMergeWrappers != 0, mInlineChain);
+    } catch (...) {
+        // What was read when an allocation failed goes to the block too, to be released with it.
+        *block = mVastParser->mVastAdData;
+        throw;
+    }
     *block = mVastParser->mVastAdData;
     return KA_OK;
 }

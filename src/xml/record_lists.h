@@ -58,14 +58,14 @@ ListEnd<T> FindEnd(T** head) {
     return end;
 }
 
-// Appends a whole list (which may be null) at end and moves end past it.
+// Appends one node (whose next is null) at end, moves end past it and writes end's count into
+// count; returns the node.
 template <typename T>
-void Attach(ListEnd<T>& end, T* list) {
-    *end.link = list;
-    while (*end.link != nullptr) {
-        end.link = &(*end.link)->next;
-        ++end.count;
-    }
+T* Link(ListEnd<T>& end, T* node, uint32_t& count) {
+    *end.link = node;
+    end.link = &node->next;
+    count = ++end.count;
+    return node;
 }
 
 }  // namespace ka

@@ -45,7 +45,9 @@ bool ScanDecimal(const char** cursor, int width, long long* value);
 // without digits), clamped to the int range instead of overflowing.
 int ParseDecimal(const char* text);
 
-// A new[] copy of the first length characters of text, terminated.
+// A new[] copy of the first length characters of text, terminated. Like every allocation of
+// the parsers, throws std::bad_alloc when memory runs out; the public table turns that into
+// KA_ERR_NO_MEMORY.
 char* CopyText(const char* text, size_t length);
 // A new[] copy of a terminated string; null for null.
 char* CopyString(const char* text);

@@ -1,7 +1,6 @@
 #include "xml/xml_document.h"
 
 #include <cstring>
-#include <new>
 
 #include "ka/result_codes.h"
 #include "platform/bounded_string.h"
@@ -117,18 +116,15 @@ bool CXMLDocument::ReadElementText(void* node, char*& field, TextForm form) {
     // text nor the copy depends on that length.
     if (text == nullptr || text[0] == '\0') return false;
 
-    delete[] field;
-    field = nullptr;
-
     const size_t size = strlen(text);
     const bool isCData = ka::IsCDataSection(text);
     size_t begin = 0;
     size_t count = size;
     if (isCData) ka::CDataContent(text, size, &begin, &count);
-    char* copy = new (std::nothrow) char[count + 1];
-    if (copy == nullptr) return false;
-    memcpy(copy, text + begin, count);
-    copy[count] = '\0';
+    // The copy is made before the old string goes: a copy that fails leaves the field as it
+    // was, and the failure goes up to the public table instead of a text silently missing.
+    char* copy = ka::CopyText(text + begin, count);
+    delete[] field;
     field = copy;
     // Most texts hold no '&' at all; they are not searched for "&amp;" a second time.
     if (!isCData && form == TextForm::kDecoded && memchr(copy, '&', count) != nullptr) {
@@ -161,7 +157,9 @@ bool CXMLDocument::CopyAttribute(void* node, const char* name, char*& field) {
     char* value = nullptr;
     int length = 0;
     if (!ReadAttribute(node, name, &value, length)) return false;
+    // Copied first: a failed copy leaves the field as it was, never pointing at freed memory.
+    char* copy = ka::CopyText(value, static_cast<size_t>(length));
     delete[] field;
-    field = ka::CopyText(value, static_cast<size_t>(length));
+    field = copy;
     return true;
 }

@@ -39,7 +39,7 @@ public:
     // Element text for a record field: a complete CDATA section unwrapped and trimmed (its
     // content is never decoded; one that does not close is stored whole), any other text in the
     // given form. Replaces (and frees) the field's string only when the element has at least
-    // one character of text; true when it did.
+    // one character of text; true when it did. A failed copy throws and leaves the field as is.
     bool ReadElementText(void* node, char*& field, TextForm form);
     // ReadElementText in the decoded form: what most record fields hold.
     void GetElementText(void* node, char*& field);
@@ -49,7 +49,7 @@ public:
     // Looks up an attribute: true when it exists with at least one character.
     bool ReadAttribute(void* node, const char* name, char** value, int& length);
     // Replaces field with a copy of the attribute's raw value when it is present; true when it
-    // did.
+    // did. A failed copy throws and leaves the field as is.
     bool CopyAttribute(void* node, const char* name, char*& field);
 
     void* mXMLHandle;

@@ -18,6 +18,10 @@ const char* ResultText(uint32_t code) {
             return "the download failed or was stopped";
         case KA_ERR_DOWNLOAD_OPEN:
             return "the source-IO module could not start a download";
+        case KA_ERR_NO_MEMORY:
+            return "memory ran out";
+        case KA_ERR_INTERNAL:
+            return "an unexpected exception inside the library";
         default:
             return "unknown result";
     }
