@@ -28,8 +28,7 @@ TEST(Exports, ExactlyTheListedNames) {
         const size_t end = line.find_last_not_of(" \t\r");
         if (end != std::string::npos && line[0] != '#') listed.insert(line.substr(0, end + 1));
     }
-    EXPECT_TRUE(listed.count("kaGetVMAPParserAPI"));
-    EXPECT_TRUE(listed.count("kaGetVMAPParserAPIAdapter"));
+    EXPECT_TRUE(listed.count("kaGetVMAPParserAPI") && listed.count("kaGetVMAPParserAPIAdapter"));
 
     std::set<std::string> exported;
     // The toolchain's own nm: a cross build's library is not for the host's.
@@ -48,10 +47,7 @@ TEST(Exports, ExactlyTheListedNames) {
     }
     ASSERT_EQ(pclose(pipe), 0) << KA_NM_PATH " failed on " << KA_LIB_PATH;
 
-    for (const std::string& name : exported) {
-        EXPECT_NE(name.compare(0, 2, "_Z"), 0) << "C++ name exported: " << name;
-    }
-    EXPECT_EQ(exported, listed);
+    EXPECT_EQ(exported, listed);  // no C++ ("_Z") name is listed
 }
 
 }  // namespace

@@ -23,8 +23,6 @@ void AllowLocalFiles(bool allow);
 void AllowLocalFilesBelow(const std::string& folder);
 
 std::vector<char> ReadFile(const std::string& path);  // empty when unreadable
-std::vector<char> ReadTestData(const std::string& relative);
-std::vector<char> ReadExample(const std::string& name);
 
 // A handle opened on the real modules and closed when it goes out of scope.
 class Handle {
@@ -49,9 +47,5 @@ private:
     void* mHandle;
     uint32_t mOpenResult;
 };
-
-// A VAST document of one Wrapper ad "outer" naming uri; by default a file in the test data.
-std::string WrapperTo(const std::string& uri = std::string(KA_TEST_DATA_DIR) +
-                                               "documents/vast/wrapped_inline.wrapped.xml");
 
 }  // namespace katest
