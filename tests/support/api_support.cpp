@@ -64,31 +64,10 @@ std::vector<char> ReadFile(const std::string& path) {
     return std::vector<char>(std::istreambuf_iterator<char>(file), {});
 }
 
-Handle::Handle() : mWorkPath(KA_MODULES_DIR), mHandle(nullptr) {
-    mOpenResult = Api().Open(&mHandle, &mWorkPath[0]);
-}
-
-Handle::~Handle() {
-    if (mHandle != nullptr) Api().Close(mHandle);
-}
-
-uint32_t Handle::Process(std::vector<char> document) {
-    // A copy freed on return: a record pointing into the buffer shows under ASan.
-    return Api().Process(mHandle, document.data(), static_cast<uint32_t>(document.size()));
-}
-
-uint32_t Handle::Process(const std::string& text) {
-    return Process(std::vector<char>(text.begin(), text.end()));
-}
-
 AdInfo* Handle::Info() const {
     AdInfo* info = nullptr;
     EXPECT_EQ(Api().GetAdInfo(mHandle, &info), KA_OK);
     return info;
-}
-
-void Handle::SetFlag(uint32_t id, bool on) {
-    EXPECT_EQ(Api().SetParam(mHandle, id, on ? kUntouched : nullptr), KA_OK);
 }
 
 VastAdData* Handle::Container() const {
