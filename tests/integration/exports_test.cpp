@@ -4,6 +4,7 @@
 
 #include <cstdio>
 #include <fstream>
+#include <regex>
 #include <set>
 #include <sstream>
 #include <string>
@@ -12,13 +13,9 @@ namespace {
 
 // Names the linker adds to every shared object, and the hooks an instrumented build defines.
 bool IsToolchainName(const std::string& name) {
-    for (std::string linker : {"_init", "_fini", "_edata", "_end", "__bss_start"}) {
-        if (name == linker) return true;
-    }
-    for (std::string prefix : {"__asan", "__odr_asan", "__ubsan", "__lsan", "__sanitizer"}) {
-        if (name.compare(0, prefix.size(), prefix) == 0) return true;
-    }
-    return false;
+    static const std::regex kNames(
+        "_init|_fini|_edata|_end|__bss_start|(__asan|__odr_asan|__ubsan|__lsan|__sanitizer).*");
+    return std::regex_match(name, kNames);
 }
 
 TEST(Exports, ExactlyTheListedNames) {

@@ -115,7 +115,6 @@ TEST(Kavmap, FailuresExitNonZeroWithOneLine) {
     } kFailures[] = {
         // clang-format off
         {"not xml", Data("documents/vmap/invalid_not_xml.xml"), 1, "Process failed: 0x91001000"},
-        {"truncated", Data("documents/vmap/invalid_truncated.xml"), 1, "Process failed: 0x91001000"},
         {"empty stdin", "-", 1, "Process failed: 0x91001000"},
         {"missing file", Data("documents/no_such_file.xml"), 1, "cannot open"},
         {"no modules", "--modules /nonexistent/ " + Example("vmap-playlist.xml"), 1,
