@@ -4,6 +4,7 @@
 
 #include <cstdio>
 #include <fstream>
+#include <regex>
 #include <set>
 #include <sstream>
 #include <string>
@@ -12,13 +13,9 @@ namespace {
 
 // Names the linker adds to every shared object, and the hooks an instrumented build defines.
 bool IsToolchainName(const std::string& name) {
-    for (std::string linker : {"_init", "_fini", "_edata", "_end", "__bss_start"}) {
-        if (name == linker) return true;
-    }
-    for (std::string prefix : {"__asan", "__odr_asan", "__ubsan", "__lsan", "__sanitizer"}) {
-        if (name.compare(0, prefix.size(), prefix) == 0) return true;
-    }
-    return false;
+    static const std::regex kNames(
+        "_init|_fini|_edata|_end|__bss_start|(__asan|__odr_asan|__ubsan|__lsan|__sanitizer).*");
+    return std::regex_match(name, kNames);
 }
 
 TEST(Exports, ExactlyTheListedNames) {
@@ -28,8 +25,7 @@ TEST(Exports, ExactlyTheListedNames) {
         const size_t end = line.find_last_not_of(" \t\r");
         if (end != std::string::npos && line[0] != '#') listed.insert(line.substr(0, end + 1));
     }
-    EXPECT_TRUE(listed.count("kaGetVMAPParserAPI"));
-    EXPECT_TRUE(listed.count("kaGetVMAPParserAPIAdapter"));
+    EXPECT_TRUE(listed.count("kaGetVMAPParserAPI") && listed.count("kaGetVMAPParserAPIAdapter"));
 
     std::set<std::string> exported;
     // The toolchain's own nm: a cross build's library is not for the host's.
@@ -48,10 +44,7 @@ TEST(Exports, ExactlyTheListedNames) {
     }
     ASSERT_EQ(pclose(pipe), 0) << KA_NM_PATH " failed on " << KA_LIB_PATH;
 
-    for (const std::string& name : exported) {
-        EXPECT_NE(name.compare(0, 2, "_Z"), 0) << "C++ name exported: " << name;
-    }
-    EXPECT_EQ(exported, listed);
+    EXPECT_EQ(exported, listed);  // no C++ ("_Z") name is listed
 }
 
 }  // namespace

@@ -23,35 +23,34 @@ void AllowLocalFiles(bool allow);
 void AllowLocalFilesBelow(const std::string& folder);
 
 std::vector<char> ReadFile(const std::string& path);  // empty when unreadable
-std::vector<char> ReadTestData(const std::string& relative);
-std::vector<char> ReadExample(const std::string& name);
 
 // A handle opened on the real modules and closed when it goes out of scope.
 class Handle {
 public:
-    Handle();
-    ~Handle();
+    Handle() { mOpenResult = Api().Open(&mHandle, &mWorkPath[0]); }
+    ~Handle() { Api().Close(mHandle); }
     Handle(const Handle&) = delete;
     Handle& operator=(const Handle&) = delete;
 
     void* get() const { return mHandle; }
     uint32_t openResult() const { return mOpenResult; }
-    uint32_t Process(std::vector<char> document);
-    uint32_t Process(const std::string& text);
+    // A copy freed on return: a record pointing into the buffer shows under ASan.
+    uint32_t Process(std::vector<char> copy) {
+        return Api().Process(mHandle, copy.data(), static_cast<uint32_t>(copy.size()));
+    }
+    uint32_t Process(const std::string& text) {
+        return Process(std::vector<char>(text.begin(), text.end()));
+    }
     AdInfo* Info() const;
     // SetParam with a non-null value for true.
-    void SetFlag(uint32_t id, bool on);
+    void SetFlag(uint32_t id, bool on) { Api().SetParam(mHandle, id, on ? kUntouched : nullptr); }
     // What GetVastAdData lends, or kUntouched when it writes nothing.
     VastAdData* Container() const;
 
 private:
-    std::string mWorkPath;  // the handle keeps the path by pointer
-    void* mHandle;
+    std::string mWorkPath = KA_MODULES_DIR;  // the handle keeps the path by pointer
+    void* mHandle = nullptr;
     uint32_t mOpenResult;
 };
-
-// A VAST document of one Wrapper ad "outer" naming uri; by default a file in the test data.
-std::string WrapperTo(const std::string& uri = std::string(KA_TEST_DATA_DIR) +
-                                               "documents/vast/wrapped_inline.wrapped.xml");
 
 }  // namespace katest

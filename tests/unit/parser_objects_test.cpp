@@ -51,8 +51,7 @@ TEST(ExtensionParser, OneObjectPerAdOwnedByTheAd) {
     ExtensionLog log;
     auto process = [&](CVASTParser& parser, uint32_t result, std::string document) {
         ASSERT_EQ(parser.Open(modules), 0u);
-        int dummy = 0;
-        EXPECT_EQ(parser.SetParam(0x45000002u, &dummy), 0u);  // other ids are ignored
+        EXPECT_EQ(parser.SetParam(0x45000002u, modules), 0u);  // other ids are ignored
         EXPECT_EQ(parser.mExtensionParser, nullptr);
         parser.SetParam(KA_PID_VAST_EXTENSION_PARSER,
                         new TestExtensionParser(&parser, &log, result));
@@ -79,8 +78,7 @@ TEST(ExtensionParser, OneObjectPerAdOwnedByTheAd) {
         EXPECT_EQ(log.destroyed, 3);
         // A failed Parse stores nothing.
         process(parser, 7, "<VAST><Ad><InLine><Extensions/></InLine></Ad></VAST>");
-        EXPECT_EQ(log.parsed, 4);
-        EXPECT_EQ(log.built, 3);
+        EXPECT_TRUE(log.parsed == 4 && log.built == 3);
         EXPECT_EQ(Serial(parser.mVastAdData.firstAd), 0);
         parser.ReleaseVastAdData(&parser.mVastAdData);
     }
