@@ -90,10 +90,4 @@ inline SourceIOApi& SourceIo() {
     return api;
 }
 
-// A module-wide setting of the source-IO module.
-inline void SetModule(uint32_t id, uint32_t value) {
-    ASSERT_NE(nullptr, SourceIo().SetParam);
-    ASSERT_EQ(0u, SourceIo().SetParam(nullptr, id, &value));
-}
-
 }  // namespace loopback

@@ -1,6 +1,5 @@
-// Downloads through the real source-IO stand-in against a loopback HTTP server started in this
-// process (127.0.0.1 only), and the read loop against a scripted module whose cases are in
-// tests/data/net/read_cases.txt.
+// Downloads through the source-IO stand-in from a loopback HTTP server in this process (127.0.0.1
+// only), and the read loop against a scripted module playing tests/data/net/read_cases.txt.
 #include "ka/download.h"
 
 #include <gtest/gtest.h>
@@ -21,7 +20,6 @@
 namespace {
 
 using Clock = std::chrono::steady_clock;
-using loopback::SetModule;
 
 // Every byte value, zero included.
 const std::string kDocument = [] {
@@ -48,10 +46,10 @@ std::string Fetch(std::string url, uint32_t* code, KA_BOOL* stop = nullptr,
 // the stand-in reads only when enabled and inside its base.
 TEST(Download, FromTheLoopbackServer) {
     loopback::Server server;
-    ASSERT_TRUE(server.Running());
+    SourceIOApi& api = loopback::SourceIo();
+    ASSERT_TRUE(server.Running() && api.SetParam != nullptr);
     server.Put("doc", kDocument);
     server.Put("dir/doc", "in dir");
-    SourceIOApi& api = loopback::SourceIo();
     DownloadRecord storage = {}, *record = &storage;
     uint8_t* buffer = nullptr;
     uint32_t capacity = 0, count = 0, asked = 0;
@@ -119,7 +117,8 @@ TEST(Download, FromTheLoopbackServer) {
     };
     for (const auto& c : cases) {
         SCOPED_TRACE(std::string(1, c.via) + " " + c.url + " stop " + std::to_string(c.stop));
-        SetModule(ka::kSioTotalTimeoutMs, c.totalTimeoutMs);
+        uint32_t limit = c.totalTimeoutMs;
+        ASSERT_EQ(0u, api.SetParam(nullptr, ka::kSioTotalTimeoutMs, &limit));
         snprintf(record->url, sizeof(record->url), "%s", c.url.c_str());
         record->allocator = c.via == 'a' ? &allocator : nullptr;
         if (c.via != 'b') record->buffer = nullptr;
@@ -160,11 +159,10 @@ TEST(Download, FromTheLoopbackServer) {
         EXPECT_EQ(buffer, record->buffer);
         EXPECT_EQ(count, record->size);
     }
+    char* const url = record->url;
     EXPECT_EQ(KA_ERR_NULL_ARGUMENT, ka_download_by_url(nullptr, &buffer, &count, nullptr, nullptr));
-    EXPECT_EQ(KA_ERR_NULL_ARGUMENT,
-              ka_download_by_url(record->url, nullptr, &count, nullptr, nullptr));
-    EXPECT_EQ(KA_ERR_NULL_ARGUMENT,
-              ka_download_by_url(record->url, &buffer, nullptr, nullptr, nullptr));
+    EXPECT_EQ(KA_ERR_NULL_ARGUMENT, ka_download_by_url(url, nullptr, &count, nullptr, nullptr));
+    EXPECT_EQ(KA_ERR_NULL_ARGUMENT, ka_download_by_url(url, &buffer, nullptr, nullptr, nullptr));
     EXPECT_EQ(KA_ERR_NULL_ARGUMENT,
               DownloadToBuffer(&api, nullptr, nullptr, nullptr, nullptr, nullptr, &buffer,
                                &capacity, &count, nullptr, 0, nullptr, nullptr));
@@ -175,7 +173,8 @@ TEST(Download, FromTheLoopbackServer) {
     ASSERT_FALSE(local.empty());
     const std::string file = "file://" + kLocal, toFile = server.Url("/redirect?to=" + file);
     for (bool allowed : {true, false}) {  // ends with the defaults
-        SetModule(ka::kSioAllowFiles, allowed);
+        uint32_t on = allowed;
+        ASSERT_EQ(0u, api.SetParam(nullptr, ka::kSioAllowFiles, &on));
         api.SetParam(nullptr, ka::kSioFileBaseDir,
                      allowed ? const_cast<char*>(KA_TEST_DATA_DIR "net") : nullptr);
         // Relative references stay inside the base; only regular files; no redirect to a file.
