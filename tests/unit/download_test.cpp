@@ -65,9 +65,10 @@ TEST(Download, FromTheLoopbackServer) {
     snprintf(record->baseURL, KA_DOWNLOAD_URL_SIZE, "%s",
              server.Url("/d/dir/index.xml?u=a/b").c_str());
     // The stand-in refuses bodies over the limit itself; this table reports one byte more.
-    SourceIOApi over = api, noInit = api, noFinal = api;
+    SourceIOApi over = api, noInit = api, noUninit = api, noFinal = api;
     over.GetSourceSize = [](void*, uint64_t* size) { return *size = KA_DOWNLOAD_MAX_SIZE + 1, 0u; };
     noInit.Init = nullptr;
+    noUninit.Uninit = nullptr;
     noFinal.GetParam = [](void* handle, uint32_t id, void* value) {
         return id == ka::kSioFinalUrl ? 5u : loopback::SourceIo().GetParam(handle, id, value);
     };
@@ -111,7 +112,8 @@ TEST(Download, FromTheLoopbackServer) {
         {'b', doc, 0, KA_ERR_LOAD_FAILED, "<none>", "", 0, 0, &over},
         {'b', doc, 0, KA_ERR_DOWNLOAD_OPEN, "<none>", "", 0, 0, nullptr},
         {'b', doc, 0, KA_ERR_DOWNLOAD_OPEN, "<none>", "", 0, 0, &noInit},
-        {'b', redirect, 0, 0, kDocument, redirect, 1, 0, &noFinal},  // the URL as asked
+        {'b', doc, 0, KA_ERR_DOWNLOAD_OPEN, "<none>", "", 0, 0, &noUninit},  // could not close
+        {'b', redirect, 0, 0, kDocument, redirect, 1, 0, &noFinal},          // the URL as asked
         {'a', doc, 0, 0, kDocument, doc},
         {'n', doc, 0, KA_ERR_LOAD_FAILED},
     };
