@@ -64,8 +64,7 @@ public:
     int Requests(const std::string& path = "") {
         std::lock_guard<std::mutex> lock(mutex_);
         int total = 0;
-        for (const auto& entry : counts_)
-            total += path.empty() || entry.first == path ? entry.second : 0;
+        for (const auto& e : counts_) total += path.empty() || e.first == path ? e.second : 0;
         return total;
     }
 
@@ -79,9 +78,6 @@ private:
     std::map<std::string, int> counts_;
 };
 
-// A URL on a 127.0.0.1 port that nothing listens on any more.
-inline std::string RefusedUrl() { return Server().Url("/d/x"); }
-
 // The source-IO module's table, loaded once from the modules folder.
 inline SourceIOApi& SourceIo() {
     static SourceIOApi api = [] {
@@ -92,12 +88,6 @@ inline SourceIOApi& SourceIo() {
         return table;
     }();
     return api;
-}
-
-// A module-wide setting of the source-IO module.
-inline void SetModule(uint32_t id, uint32_t value) {
-    ASSERT_NE(nullptr, SourceIo().SetParam);
-    ASSERT_EQ(0u, SourceIo().SetParam(nullptr, id, &value));
 }
 
 }  // namespace loopback
