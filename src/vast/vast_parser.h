@@ -82,8 +82,8 @@ public:
     // Wrapper chain (wrapper_chain.cpp).
     // Downloads the ad's vastAdTagUri and parses it with a nested parser one level deeper, in
     // the same chain, which the wrapper body then owns. 0 when there is nothing to fetch,
-    // 0x91001000 when the chain has no fetch left or the download fails or is empty, otherwise
-    // the nested Process result.
+    // 0x91001000 when a limit of the chain (fetches, bytes, deadline, the reference's length or
+    // scheme) refuses it or the download fails or is empty, otherwise the nested Process result.
     unsigned int FetchWrapper(AdData* ad, ka::ChainContext& chain);
     // Puts the first ad of the nested parser's result in the wrapper ad's place and copies the
     // wrapper's impressions, click tracking and tracking events into it; destroys the nested
