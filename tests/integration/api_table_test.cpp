@@ -46,7 +46,6 @@ TEST(ApiTable, NullHandleInEverySlotButOpen) {
     EXPECT_TRUE(info == nullptr && vast == kUntouched && flag == 7u);
 }
 
-// A folder with no module at all, then one with the loader but no XML module.
 TEST(ApiTable, OpenWithoutXmlModuleLeavesHandleUntouched) {
     char pattern[] = "/tmp/ka_vmap_api_XXXXXX";
     ASSERT_NE(mkdtemp(pattern), nullptr);
@@ -73,9 +72,7 @@ TEST(ApiTable, OpenWithoutXmlModuleLeavesHandleUntouched) {
         EXPECT_EQ(handle, kUntouched);
         if (handle != kUntouched && handle != nullptr) Api().Close(handle);
     }
-    for (const auto& c : cases) {
-        if (!c.link.empty()) unlink((dir + c.link).c_str());
-    }
+    for (const auto& c : cases) unlink((dir + c.link).c_str());
     rmdir(pattern);
 }
 
@@ -85,7 +82,6 @@ TEST(ApiHandle, ParametersByIdentifier) {
     void* h = handle.get();
     EXPECT_EQ(handle.Container(), kUntouched);  // no VAST parser yet
     KA_BOOL stop = 0;
-    // Each SetParam in turn, then what GetParam(VAST_ONLY) reads back.
     const struct {
         uint32_t id;
         void* value;
@@ -140,7 +136,6 @@ TEST(ApiModes, SwitchesReleaseExactlyWhatWasBuilt) {
     }
 }
 
-// Every level carries a name some handler knows, so a walk by depth would follow it.
 TEST(ApiHandle, DeepNestingDoesNotRecurse) {
     Handle handle;
     const int kDepth = 100000;

@@ -1,12 +1,14 @@
 // What an ad server can make one Process spend, through the public table, with the documents
 // served by a loopback server in this process: the deadline, the byte budget, the share of merge
-// copies, and where relative references lead.
+// copies, where relative references lead, each hop fetched once, and the stop flag ending a
+// stalled fetch.
 #include "ka/chain_limits.h"
 
 #include <gtest/gtest.h>
 
 #include <chrono>
 #include <string>
+#include <thread>
 
 #include "api_support.h"
 #include "loopback.h"
@@ -146,6 +148,7 @@ TEST_F(ChainLimits, RelativeReferencesAndSchemes) {
          "in"},
         {Vast(WrapperAd("d", "relative")), nullptr, AD_TYPE_WRAPPER, "d"},
         {Vast(WrapperAd("e", server_.Url("/d/file"))), nullptr, AD_TYPE_WRAPPER, "file"},
+        {Vast(WrapperAd("f", server_.Url("/d/missing"))), nullptr, AD_TYPE_WRAPPER, "f"},  // 404
     };
     katest::AllowLocalFilesBelow(folder);  // only the scheme rule keeps the file from being read
     for (const auto& c : kCases) {
@@ -160,6 +163,32 @@ TEST_F(ChainLimits, RelativeReferencesAndSchemes) {
     char* base = static_cast<char*>(katest::kUntouched);
     katest::Api().GetParam(handle_.get(), KA_PID_VMAP_BASE_URL, &base);
     EXPECT_EQ(base, nullptr);
+}
+
+TEST_F(ChainLimits, TwoHopsFetchEachDocumentOnce) {
+    const std::string inLine = server_.Put("inline", Vast(InLineAd("in")));
+    const std::string hop = server_.Put("w1", Vast(WrapperAd("w1", inLine)));
+    EXPECT_EQ(RunVast(Vast(WrapperAd("w0", hop)))->firstAd->type, AD_TYPE_INLINE);
+    EXPECT_EQ(server_.Requests(), 2);
+    EXPECT_EQ(server_.Requests("/d/inline"), 1);
+}
+
+// Set by another thread while the fetch waits, the flag ends it and leaves the wrapper.
+TEST_F(ChainLimits, StopFlagEndsAStalledFetch) {
+    KA_BOOL stop = 0;
+    Set(KA_PID_VMAP_STOP_FLAG, &stop);
+    std::thread stopper([&] {
+        const auto deadline = Clock::now() + std::chrono::seconds(5);
+        while (server_.Requests("/stall") == 0 && Clock::now() < deadline) {
+            std::this_thread::sleep_for(std::chrono::milliseconds(5));
+        }
+        __atomic_store_n(&stop, static_cast<KA_BOOL>(1), __ATOMIC_SEQ_CST);
+    });
+    const auto start = Clock::now();
+    EXPECT_EQ(RunVast(Vast(WrapperAd("w", server_.Url("/stall"))))->firstAd->type, AD_TYPE_WRAPPER);
+    EXPECT_LT(Clock::now() - start, std::chrono::seconds(3));  // the stall holds ten
+    stopper.join();
+    EXPECT_EQ(server_.Requests("/stall"), 1);
 }
 
 }  // namespace

@@ -27,7 +27,6 @@ std::string Text(const std::string& path) {
     return std::string(data.begin(), data.end());
 }
 
-// Runs kavmap with the given (already quoted) arguments, feeding it stdinFile.
 RunResult RunKavmap(const std::string& args, const std::string& stdinFile = "/dev/null") {
     const std::string out = "/tmp/ka_kavmap_" + std::to_string(getpid());
     const int status = system((Quote(KA_KAVMAP_PATH) + " " + args + " <" + Quote(stdinFile) + " >" +
@@ -47,8 +46,6 @@ TEST(Kavmap, PrintsTheRecords) {
     std::string modules = KA_MODULES_DIR;
     modules.pop_back();  // the folder without its trailing "/" is accepted as well
     const std::string playlist = "documents/vmap/vmap-playlist", chain = "documents/vast/";
-    // The fetched wrapper names a local file, which must not be read: file access is for local
-    // documents only.
     loopback::Server server;
     const std::string url = server.Put(
         "v.xml", "<VAST><Ad id=\"outer\"><Wrapper><VASTAdTagURI>" KA_TEST_DATA_DIR
@@ -62,7 +59,6 @@ TEST(Kavmap, PrintsTheRecords) {
         {"--lib " + Quote(KA_LIB_PATH) + " --modules " + Quote(modules) + " --json " +
              Data(playlist + ".xml"), "/dev/null", playlist, {}},
         {"--json -", KA_TEST_DATA_DIR + playlist + ".xml", playlist, {}},
-        // Wrapped files resolve next to the document.
         {"--json --vast " + Data(chain + "wrapper-1.xml"), "/dev/null", chain + "wrapper-1", {}},
         {"--json --vast --no-merge " + Data("documents/vast-no-merge/chain_three.xml"), "/dev/null",
          "documents/vast-no-merge/chain_three", {}},
@@ -88,7 +84,6 @@ TEST(Kavmap, PrintsTheRecords) {
          {"ad 1: id outer, sequence 0, Wrapper\n",
           "  wrapped document:\n    VAST: 1 ads, depth 1, error URL -\n"
           "    ad 1: id wrapped, sequence 0, InLine\n"}},
-        // Control bytes of the document show escaped; none reaches the terminal.
         {"--vast " + Data("documents/vast/raw_bytes.xml"), "/dev/null", "",
          {"ad 1: id \\x1b[31mred\\x1b[0m, sequence 0, InLine\n",
           "  ad system: bell\\x07 escape\\x1b]0;title\\x07 del\\x7f c1\\xc2\\x9b end\n",

@@ -13,6 +13,7 @@
 #include <thread>
 #include <vector>
 
+#include "case_file.h"
 #include "ka/result_codes.h"
 #include "loopback.h"
 #include "net/download.h"
@@ -277,13 +278,11 @@ TEST(ReadSourceData, FollowsTheReadRules) {
         *static_cast<uint64_t*>(value) = gScript.n[5];
         return static_cast<uint32_t>(gScript.n[4]);
     };
-    std::ifstream file(KA_TEST_DATA_DIR "net/read_cases.txt");
-    std::string line;
-    int cases = 0;
-    while (std::getline(file, line)) {
-        if (line.empty() || line[0] == '#') continue;
+    const auto rows = katest::ReadCases(KA_TEST_DATA_DIR "net/read_cases.txt");
+    for (const auto& row : rows) {
+        std::string line;
+        for (const std::string& f : row) line += f + " ";
         SCOPED_TRACE(line);
-        ++cases;
         for (char& ch : line) ch = ch == '/' || ch == '|' ? ' ' : ch;
         std::istringstream in(line);
         gScript = Script();
@@ -299,7 +298,7 @@ TEST(ReadSourceData, FollowsTheReadRules) {
         EXPECT_EQ(n[8], gScript.queries);
         for (uint32_t i = 0; i < count; ++i) ASSERT_EQ(static_cast<uint8_t>(0xa0 + i), buffer[i]);
     }
-    EXPECT_EQ(13, cases);
+    EXPECT_EQ(13u, rows.size());
 }
 
 }  // namespace

@@ -2,34 +2,19 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
-#include <fstream>
 #include <string>
 #include <vector>
 
+#include "case_file.h"
 #include "ka/result_codes.h"
 #include "xml/text.h"
 
 namespace {
 
 TEST(TextHelpers, Cases) {
-    std::ifstream file(KA_TEST_DATA_DIR "text_cases.txt");
-    std::string line;
-    int cases = 0;
-    while (std::getline(file, line)) {
-        if (line.empty() || line[0] == '#') continue;
-        SCOPED_TRACE(line);
-        std::vector<std::string> f;
-        for (size_t at = 0, end = 0; end != std::string::npos; at = end + 3) {
-            end = line.find(" | ", at);
-            std::string field = line.substr(at, end - at);
-            for (size_t x = field.find("\\x"); x != std::string::npos;
-                 x = field.find("\\x", x + 1)) {
-                field.replace(x, 4, 1,
-                              static_cast<char>(std::stoi(field.substr(x + 2, 2), nullptr, 16)));
-            }
-            f.push_back(field == "\"\"" ? "" : field);
-        }
-        ++cases;
+    auto rows = katest::ReadCases(KA_TEST_DATA_DIR "text_cases.txt");
+    for (auto& f : rows) {
+        SCOPED_TRACE(testing::PrintToString(f));
         if (f[0] == "cdata") {
             const size_t size = std::stoul(f[2]);
             std::vector<char> dst(size + 8, 'Z');
@@ -48,7 +33,7 @@ TEST(TextHelpers, Cases) {
             EXPECT_EQ(std::stoul(f[2]), string2time(f[1].c_str(), int(f[1].size()) + 1));
         }
     }
-    EXPECT_GT(cases, 40);
+    EXPECT_GT(rows.size(), 40u);
 }
 
 TEST(TextHelpers, NullAndEdgeArguments) {

@@ -4,9 +4,10 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
-#include <fstream>
 #include <string>
 #include <vector>
+
+#include "case_file.h"
 
 namespace {
 
@@ -25,18 +26,9 @@ struct Buf {
 };
 
 TEST(Uri, Cases) {
-    std::ifstream file(KA_TEST_DATA_DIR "uri_cases.txt");
-    std::string line;
-    int cases = 0;
-    while (std::getline(file, line)) {
-        if (line.empty() || line[0] == '#') continue;
-        SCOPED_TRACE(line);
-        Strings f;
-        for (size_t at = 0, end = 0; end != std::string::npos; at = end + 3) {
-            end = line.find(" | ", at);
-            f.push_back(line.substr(at, end - at));
-            if (f.back() == "\"\"") f.back().clear();
-        }
+    const auto rows = katest::ReadCases(KA_TEST_DATA_DIR "uri_cases.txt");
+    for (const Strings& f : rows) {
+        SCOPED_TRACE(testing::PrintToString(f));
         std::vector<Buf> in(f.begin() + 1, f.end());
         Buf out("garbage to be replaced"), s, a, p, q, h;
         uint32_t result = 0;
@@ -58,11 +50,10 @@ TEST(Uri, Cases) {
             }
             got = {out.bytes};
         }
-        ++cases;
         EXPECT_EQ(0u, result);
         EXPECT_EQ(Strings(f.end() - static_cast<long>(got.size()), f.end()), got);
     }
-    EXPECT_GT(cases, 80);
+    EXPECT_GT(rows.size(), 80u);
 }
 
 // Null arguments are skipped; a null or empty base or URI leaves things alone.
