@@ -138,6 +138,7 @@ TEST(Download, FromTheLoopbackServer) {
         KA_BOOL stop = c.stop;
         uint32_t code = 0;
         std::string text = "<none>";
+        info = {};
         const auto start = Clock::now();
         if (c.via == 'u') text = Fetch(c.url, &code, &stop, c.workPath);
         if (c.via == 'b') {
@@ -145,8 +146,8 @@ TEST(Download, FromTheLoopbackServer) {
                                     &capacity, &count, &stop, c.useBase, &info, agent);
         }
         if (c.via == 'a' || c.via == 'n') {
-            code = DownloadWithAllocator(c.api, &request, &request, &request, &request, record,
-                                         &stop, c.useBase, &info, agent);
+            code = DownloadWithAllocator(c.api, nullptr, nullptr, nullptr, nullptr, record, &stop,
+                                         c.useBase, nullptr, nullptr);  // nothing optional
         }
         const auto ms = std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - start);
         EXPECT_GE(ms.count() + 50, c.totalTimeoutMs);  // at the module's time limit, not before
