@@ -68,9 +68,9 @@ uint32_t PollSourceSize(SourceIOApi* api, void* handle, const KA_BOOL* stopFlag,
         if (result == KA_ERR_DOWNLOAD_FAILED) return result;
         if (result == 0) return 0;
         if (check == StopCheck::kAfterEachAsk && IsStopped(stopFlag)) return 0;
-        if (deadline != 0 && GetTimeNs() / 1000000u + kPollMs > deadline) {
+        const uint64_t now = deadline != 0 ? ka::MonotonicMs() : 0;
+        if (deadline != 0 && now + kPollMs > deadline) {
             // One more pause would end past the deadline: wait out what is left, ask once more.
-            const uint64_t now = GetTimeNs() / 1000000u;
             if (now < deadline) SleepMs(static_cast<uint32_t>(deadline - now));
             if (api->GetSourceSize(handle, size) == 0) return 0;
             return KA_ERR_DOWNLOAD_TIMEOUT;

@@ -6,6 +6,7 @@
 #include <cstdint>
 
 #include "ka/download.h"
+#include "ka/os_utils.h"
 #include "ka/types.h"
 #include "platform/limits.h"
 
@@ -19,10 +20,13 @@ uint32_t ka_download_by_url(char* url, unsigned char** data, uint32_t* size, cha
 
 namespace ka {
 
+// The clock of download deadlines: milliseconds of CLOCK_MONOTONIC.
+inline uint64_t MonotonicMs() { return GetTimeNs() / 1000000u; }
+
 // What a wrapped document's download may spend, and what it reports besides the body.
 struct DocumentFetch {
     uint64_t maxBytes;        // a larger document fails and nothing of it is kept; 0: no limit
-    uint64_t deadline;        // GetTimeNs milliseconds at which the wait ends; 0: none
+    uint64_t deadline;        // MonotonicMs at which the wait ends; 0: none
     char finalUrl[kUrlSize];  // on success, the URL reached after redirects, or ""
     bool overLimit;           // set when the document was larger than maxBytes
 };

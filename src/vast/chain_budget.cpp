@@ -1,23 +1,17 @@
 #include "ka/logging.h"
-#include "ka/os_utils.h"
+#include "net/download.h"
 #include "vast/chain_context.h"
 
 namespace ka {
 
-namespace {
-
-uint64_t NowMs() { return GetTimeNs() / 1000000u; }
-
-}  // namespace
-
 ChainBudget ChainBudget::Start(uint64_t fetchBytes, uint32_t deadlineMs) {
     ChainBudget budget = {};
     budget.fetchBytesLeft = fetchBytes;
-    budget.deadline = deadlineMs != 0 ? NowMs() + deadlineMs : 0;
+    budget.deadline = deadlineMs != 0 ? MonotonicMs() + deadlineMs : 0;
     return budget;
 }
 
-bool ChainBudget::DeadlinePassed() const { return deadline != 0 && NowMs() >= deadline; }
+bool ChainBudget::DeadlinePassed() const { return deadline != 0 && MonotonicMs() >= deadline; }
 
 bool ChainBudget::TakeMergeBytes(size_t bytes) {
     const uint64_t cap =

@@ -15,7 +15,7 @@ namespace ka {
 // What one Process may still spend, over every chain it starts.
 struct ChainBudget {
     uint64_t fetchBytesLeft;  // bytes of wrapped documents still allowed
-    uint64_t deadline;        // GetTickCount64-style milliseconds; 0: none
+    uint64_t deadline;        // ka::MonotonicMs() at which downloads end; 0: none
     uint64_t parsedBytes;     // the caller's document and every fetched one
     uint64_t mergeBytes;      // what merges have copied so far
     bool mergeCapLogged;
