@@ -9,6 +9,7 @@
 #include "ka/types.h"
 #include "ka/vast_records.h"
 #include "ka/vmap_parser_api.h"
+#include "ka/vmap_parser_ext.h"
 #include "ka/vmap_records.h"
 
 #endif /* KA_VMAP_PARSER_H */

