@@ -37,7 +37,7 @@ public:
     // Terminates a result that fits; else wipes what was written, so that no cut-short URL is
     // left behind.
     bool Finish() {
-        if (Fits(1)) {
+        if (Fits(0)) {
             mOut[mSize] = '\0';
             return true;
         }
