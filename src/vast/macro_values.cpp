@@ -116,7 +116,7 @@ void Spell(MacroValue* value, int written) {
 
 // Offsets past a day are no zone's: they read as the device's own.
 constexpr int32_t kMaxOffsetMinutes = 24 * 60 - 1;
-// The last millisecond of year 9999, so that the year keeps ISO 8601's four digits.
+// The last millisecond of year 9999 UTC: years keep ISO 8601's four digits.
 constexpr int64_t kLastTimestampMs = 253402300799999;
 
 void SpellTimestamp(const KaMacroValues* values, const MacroCall& call, MacroValue* value) {
@@ -135,19 +135,21 @@ void SpellTimestamp(const KaMacroValues* values, const MacroCall& call, MacroVal
                      ? static_cast<int32_t>(local.tm_gmtoff / 60)
                      : 0;
     }
-    const int64_t shifted = ms + int64_t{offset} * 60000;
+    // Far-off times are checked before the shift, which could overflow otherwise.
     struct tm t = {};
-    const time_t seconds = static_cast<time_t>(shifted / 1000);
-    if (shifted < 0 || shifted > kLastTimestampMs || gmtime_r(&seconds, &t) == nullptr) {
+    const int64_t shifted = ms <= kLastTimestampMs ? ms + int64_t{offset} * 60000 : -1;
+    const time_t seconds = static_cast<time_t>(shifted / 1000 - (shifted % 1000 < 0 ? 1 : 0));
+    if (ms > kLastTimestampMs || gmtime_r(&seconds, &t) == nullptr || t.tm_year + 1900 > 9999) {
         Sentinel(false, 0, value);
         return;
     }
+    const int millis = static_cast<int>(shifted - int64_t{seconds} * 1000);
     const int32_t minutes = offset < 0 ? -offset : offset;
-    Spell(value, snprintf(value->number, sizeof(value->number),
-                          "%04d-%02d-%02dT%02d:%02d:%02d.%03d%c%02d:%02d", t.tm_year + 1900,
-                          t.tm_mon + 1, t.tm_mday, t.tm_hour, t.tm_min, t.tm_sec,
-                          static_cast<int>(shifted % 1000), offset < 0 ? '-' : '+',
-                          static_cast<int>(minutes / 60), static_cast<int>(minutes % 60)));
+    Spell(value,
+          snprintf(value->number, sizeof(value->number),
+                   "%04d-%02d-%02dT%02d:%02d:%02d.%03d%c%02d:%02d", t.tm_year + 1900, t.tm_mon + 1,
+                   t.tm_mday, t.tm_hour, t.tm_min, t.tm_sec, millis, offset < 0 ? '-' : '+',
+                   static_cast<int>(minutes / 60), static_cast<int>(minutes % 60)));
 }
 
 void Fill(const Macro& macro, const KaMacroValues* values, const MacroCall& call,
