@@ -114,7 +114,7 @@ typedef struct KaMacroValues {
  * be null); KA_ERR_NULL_ARGUMENT when urlTemplate or out is null; KA_ERR_BUFFER_TOO_SMALL when
  * the result with its terminator exceeds outSize: out is then "" (when outSize > 0), never a
  * URL cut short, and *outLength is the outSize that would fit it (UINT32_MAX: more than fits
- * a uint32_t). Thread-safe; allocates nothing. */
+ * a uint32_t). Thread-safe; takes no memory of its own. */
 KA_EXTERN_C KA_API uint32_t kaExpandVASTMacros(const char* urlTemplate, const KaMacroValues* values,
                                                char* out, uint32_t outSize, uint32_t* outLength);
 
