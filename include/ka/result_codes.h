@@ -24,5 +24,8 @@
 /* A C++ exception other than an allocation failure reached the public table, such as one thrown
  * by a host's extension parser; the handle is left as after KA_ERR_NO_MEMORY. */
 #define KA_ERR_INTERNAL 0x91001003u
+/* The result does not fit the caller's buffer; the buffer holds an empty string and the size
+ * that fits is reported (kaExpandVASTMacros). */
+#define KA_ERR_BUFFER_TOO_SMALL 0x91003001u
 
 #endif /* KA_RESULT_CODES_H */

@@ -12,9 +12,8 @@ constexpr uint32_t kFirstSlot = offsetof(VMAPParserExtAPI, GetChainOutcomes);
 template <typename Slot>
 void Fill(VMAPParserExtAPI* api, uint32_t room, Slot VMAPParserExtAPI::*slot, Slot value,
           uint32_t& filled) {
-    const uint32_t end = static_cast<uint32_t>(
-        reinterpret_cast<const char*>(&(api->*slot)) - reinterpret_cast<const char*>(api) +
-        sizeof(Slot));
+    const uint32_t end = static_cast<uint32_t>(reinterpret_cast<const char*>(&(api->*slot)) -
+                                               reinterpret_cast<const char*>(api) + sizeof(Slot));
     if (end > room) return;
     api->*slot = value;
     if (end > filled) filled = end;
@@ -26,7 +25,7 @@ uint32_t kaGetVMAPParserExtAPI(VMAPParserExtAPI* api) {
     if (api == nullptr || api->size < kFirstSlot + sizeof(void*)) return KA_ERR_NULL_ARGUMENT;
     const uint32_t room = api->size;
     uint32_t filled = kFirstSlot;
-    (void)room;
+    Fill(api, room, &VMAPParserExtAPI::ExpandMacros, &kaExpandVASTMacros, filled);
     api->size = filled;
     return KA_OK;
 }

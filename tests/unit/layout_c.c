@@ -25,12 +25,18 @@ _Static_assert(sizeof(CVASTParser*) == sizeof(void*), "opaque pointers are point
  * incompatible pointer assignment, which the build treats as an error. */
 static uint32_t (*const kEntry)(VMAPParserAPI*) = kaGetVMAPParserAPI;
 static uintptr_t (*const kAdapter)(void) = kaGetVMAPParserAPIAdapter;
+static uint32_t (*const kExpand)(const char*, const KaMacroValues*, char*, uint32_t,
+                                 uint32_t*) = kaExpandVASTMacros;
+/* The initializer names every field of the record, as C sees it. */
+static const KaMacroValues kMacroInit = KA_MACRO_VALUES_INIT;
 
 static const KaFieldLayout kMeasured[] = {KA_LAYOUT_MEASURED};
 
 const KaFieldLayout* ka_layout_c(unsigned long* count) {
     (void)kEntry;
     (void)kAdapter;
+    (void)kExpand;
+    (void)kMacroInit;
     *count = sizeof(kMeasured) / sizeof(kMeasured[0]);
     return kMeasured;
 }

@@ -54,14 +54,43 @@
     X(VMAPParserAPI, Open, 0, 8) X(VMAPParserAPI, Close, 8, 8) X(VMAPParserAPI, Process, 16, 8) \
     X(VMAPParserAPI, GetAdInfo, 24, 8) X(VMAPParserAPI, GetVastAdData, 32, 8) \
     X(VMAPParserAPI, GetVastParserVastAdData, 40, 8) X(VMAPParserAPI, SetParam, 48, 8) \
-    X(VMAPParserAPI, GetParam, 56, 8)
+    X(VMAPParserAPI, GetParam, 56, 8) \
+    X(KaMacroValues, size, 0, 4) X(KaMacroValues, errorCode, 4, 4) \
+    X(KaMacroValues, timestampMs, 8, 8) X(KaMacroValues, utcOffsetMinutes, 16, 4) \
+    X(KaMacroValues, breakPosition, 20, 4) X(KaMacroValues, mediaPlayheadMs, 24, 8) \
+    X(KaMacroValues, adPlayheadMs, 32, 8) X(KaMacroValues, adCount, 40, 4) \
+    X(KaMacroValues, podSequence, 44, 4) X(KaMacroValues, breakMaxDuration, 48, 4) \
+    X(KaMacroValues, breakMinDuration, 52, 4) X(KaMacroValues, breakMaxAdLength, 56, 4) \
+    X(KaMacroValues, breakMinAdLength, 60, 4) X(KaMacroValues, breakMaxAds, 64, 4) \
+    X(KaMacroValues, reason, 68, 4) X(KaMacroValues, limitAdTracking, 72, 4) \
+    X(KaMacroValues, serverSide, 76, 4) X(KaMacroValues, placementType, 80, 4) \
+    X(KaMacroValues, clickType, 84, 4) X(KaMacroValues, playerWidth, 88, 4) \
+    X(KaMacroValues, playerHeight, 92, 4) X(KaMacroValues, clickX, 96, 4) \
+    X(KaMacroValues, clickY, 100, 4) X(KaMacroValues, assetUri, 104, 8) \
+    X(KaMacroValues, contentId, 112, 8) X(KaMacroValues, contentUri, 120, 8) \
+    X(KaMacroValues, ifa, 128, 8) X(KaMacroValues, ifaType, 136, 8) \
+    X(KaMacroValues, clientUa, 144, 8) X(KaMacroValues, serverUa, 152, 8) \
+    X(KaMacroValues, deviceUa, 160, 8) X(KaMacroValues, deviceIp, 168, 8) \
+    X(KaMacroValues, latLong, 176, 8) X(KaMacroValues, domain, 184, 8) \
+    X(KaMacroValues, pageUrl, 192, 8) X(KaMacroValues, appBundle, 200, 8) \
+    X(KaMacroValues, storeId, 208, 8) X(KaMacroValues, storeUrl, 216, 8) \
+    X(KaMacroValues, inventoryState, 224, 8) X(KaMacroValues, playerState, 232, 8) \
+    X(KaMacroValues, playerCapabilities, 240, 8) X(KaMacroValues, regulations, 248, 8) \
+    X(KaMacroValues, gdprConsent, 256, 8) X(KaMacroValues, transactionId, 264, 8) \
+    X(KaMacroValues, universalAdId, 272, 8) X(KaMacroValues, adServingId, 280, 8) \
+    X(KaMacroValues, adType, 288, 8) X(KaMacroValues, adCategories, 296, 8) \
+    X(KaMacroValues, blockedAdCategories, 304, 8) X(KaMacroValues, apiFrameworks, 312, 8) \
+    X(KaMacroValues, extensions, 320, 8) X(KaMacroValues, mediaMime, 328, 8) \
+    X(KaMacroValues, vastVersions, 336, 8) X(KaMacroValues, verificationVendors, 344, 8) \
+    X(KaMacroValues, omidPartner, 352, 8)
 
 /* X(record, size) */
 #define KA_LAYOUT_SIZES(X) \
     X(VastAdData, 32) X(AdData, 32) X(AdInLine, 88) X(AdWrapper, 56) X(AdImpression, 16) \
     X(AdCreative, 136) X(AdLinear, 96) X(AdVideoClicks, 56) X(AdClick, 24) X(AdMediaFile, 72) \
     X(AdTracking, 40) X(AdParameters, 8) X(AdIcon, 8) X(AdInfo, 16) X(AdBreak, 72) \
-    X(AdSource, 40) X(AdBreakTracking, 24) X(VMAPParserAPI, 64)
+    X(AdSource, 40) X(AdBreakTracking, 24) X(VMAPParserAPI, 64) \
+    X(KaMacroValues, 360)
 
 /* X(constant, value) */
 #define KA_LAYOUT_CONSTANTS(X) \
@@ -77,7 +106,8 @@
     X(KA_PID_VMAP_CONTENT_URI, 0x44000001u) X(KA_PID_VMAP_VAST_ONLY, 0x44000002u) \
     X(KA_PID_VMAP_MERGE_WRAPPERS, 0x44000003u) X(KA_PID_VMAP_STOP_FLAG, 0x44000004u) \
     X(KA_ERR_NULL_ARGUMENT, 0x9100100bu) X(KA_ERR_LOAD_FAILED, 0x91001000u) \
-    X(KA_ERR_MODULE_NOT_LOADED, 0x90000001u)
+    X(KA_ERR_MODULE_NOT_LOADED, 0x90000001u) \
+    X(KA_ERR_BUFFER_TOO_SMALL, 0x91003001u)
 /* clang-format on */
 
 /* One measured item as the C compiler sees it: a field (offset, size), a record's sizeof (offset
