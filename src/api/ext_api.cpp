@@ -4,17 +4,23 @@
 
 #include "ka/result_codes.h"
 #include "ka/vmap_parser_ext.h"
+#include "vmap/vmap_parser.h"
 
 namespace {
+
+// Lends records and allocates nothing: no exception to guard against.
+uint32_t GetChainOutcomes(void* handle, KaChainOutcome** out) {
+    if (handle == nullptr) return KA_ERR_NULL_ARGUMENT;
+    return static_cast<CVMAPParser*>(handle)->GetChainOutcomes(out);
+}
 
 constexpr uint32_t kFirstSlot = offsetof(VMAPParserExtAPI, GetChainOutcomes);
 
 template <typename Slot>
 void Fill(VMAPParserExtAPI* api, uint32_t room, Slot VMAPParserExtAPI::*slot, Slot value,
           uint32_t& filled) {
-    const uint32_t end = static_cast<uint32_t>(
-        reinterpret_cast<const char*>(&(api->*slot)) - reinterpret_cast<const char*>(api) +
-        sizeof(Slot));
+    const uint32_t end = static_cast<uint32_t>(reinterpret_cast<const char*>(&(api->*slot)) -
+                                               reinterpret_cast<const char*>(api) + sizeof(Slot));
     if (end > room) return;
     api->*slot = value;
     if (end > filled) filled = end;
@@ -26,7 +32,7 @@ uint32_t kaGetVMAPParserExtAPI(VMAPParserExtAPI* api) {
     if (api == nullptr || api->size < kFirstSlot + sizeof(void*)) return KA_ERR_NULL_ARGUMENT;
     const uint32_t room = api->size;
     uint32_t filled = kFirstSlot;
-    (void)room;
+    Fill(api, room, &VMAPParserExtAPI::GetChainOutcomes, &GetChainOutcomes, filled);
     api->size = filled;
     return KA_OK;
 }
