@@ -51,7 +51,7 @@ void ChainTrace::BeginDocument(const char* rootError) {
 void ChainTrace::BeginAd(AdData* ad, uint64_t mergeRefusals) {
     mAds.push_back(AdTrace{
         ad, KA_CHAIN_NOT_WRAPPED, KA_VAST_ERROR_NONE, KA_CHAIN_REASON_NONE, {}, {}, mergeRefusals});
-    if (!mRootError.empty()) mAds.back().errorUrls.push_back(mRootError);
+    if (!mRootError.empty()) mAds.back().errorUrls.push_back({mRootError});
     AddErrorUrl(OwnError(ad));
     if (ad->body == nullptr) {
         End(KA_CHAIN_NOT_WRAPPED, KA_CHAIN_REASON_NO_BODY);
@@ -103,7 +103,7 @@ void ChainTrace::Clear() {
 }
 
 void ChainTrace::AddErrorUrl(const char* url) {
-    if (!mAds.empty() && url != nullptr && url[0] != '\0') mAds.back().errorUrls.push_back(url);
+    if (!mAds.empty() && url != nullptr && url[0] != '\0') mAds.back().errorUrls.push_back({url});
 }
 
 }  // namespace ka

@@ -23,13 +23,19 @@ struct HopTrace {
     bool onPath;  // leads to the ad the player gets
 };
 
+// A string of the library's own type: a std::vector<std::string> would be instantiated with
+// default visibility and exported from the library.
+struct TraceText {
+    std::string text;
+};
+
 struct AdTrace {
     AdData* ad;          // the player's node
     uint32_t state;      // KA_CHAIN_*
     uint32_t vastError;  // KA_VAST_ERROR_*
     uint32_t reason;     // KA_CHAIN_REASON_*
     std::vector<HopTrace> hops;
-    std::vector<std::string> errorUrls;
+    std::vector<TraceText> errorUrls;
     uint64_t mergeRefusalsBefore;  // the budget's count when the chain began
 };
 

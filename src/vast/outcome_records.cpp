@@ -44,11 +44,11 @@ void FillHops(const std::vector<HopTrace>& hops, KaChainOutcome* outcome) {
     }
 }
 
-void FillErrorUrls(const std::vector<std::string>& urls, KaChainOutcome* outcome) {
+void FillErrorUrls(const std::vector<TraceText>& urls, KaChainOutcome* outcome) {
     if (urls.empty()) return;
     outcome->errorUrls = NewBlocks<char*>(urls.size());
     outcome->errorUrlCount = static_cast<uint32_t>(urls.size());
-    for (size_t i = 0; i < urls.size(); ++i) outcome->errorUrls[i] = NewText(urls[i]);
+    for (size_t i = 0; i < urls.size(); ++i) outcome->errorUrls[i] = NewText(urls[i].text);
 }
 
 }  // namespace
