@@ -70,7 +70,7 @@ typedef struct KaChainHop {
     char* finalUrl;        /* the URL reached after redirects; null when the download failed */
     uint32_t depth;        /* 1: named by the player's document, 2: by the document of depth 1 */
     uint32_t result;       /* the download's result code (ka/result_codes.h); 0: downloaded */
-    uint64_t bytes;        /* bytes downloaded; 0 when the download failed */
+    uint64_t bytes;        /* bytes read; of a failed download what arrived, mostly 0 */
     uint32_t milliseconds; /* how long the download took */
     uint32_t onPath;       /* 1 when the hop leads to the ad the player got; 0: fan-out dropped */
 } KaChainHop;
