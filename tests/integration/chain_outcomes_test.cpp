@@ -15,18 +15,6 @@
 
 namespace {
 
-const VMAPParserExtAPI& Ext() {
-    static VMAPParserExtAPI ext = [] {
-        VMAPParserExtAPI table = {};
-        table.size = sizeof(table);
-        auto get = reinterpret_cast<KaGetVMAPParserExtAPIFn>(
-            katest::LibrarySymbol("kaGetVMAPParserExtAPI"));
-        EXPECT_TRUE(get != nullptr && get(&table) == KA_OK && table.GetChainOutcomes != nullptr);
-        return table;
-    }();
-    return ext;
-}
-
 // Replaces every {NAME} of text with urls[NAME].
 std::string Expand(std::string text, const std::map<std::string, std::string>& urls) {
     for (const auto& u : urls) {
@@ -87,7 +75,7 @@ TEST(ChainOutcomes, EveryRowReportsItsChain) {
             }
             ASSERT_EQ(handle.Process(document), KA_OK);
             KaChainOutcome* outcome = static_cast<KaChainOutcome*>(katest::kUntouched);
-            ASSERT_EQ(Ext().GetChainOutcomes(handle.get(), &outcome), KA_OK);
+            ASSERT_EQ(katest::ExtApi().GetChainOutcomes(handle.get(), &outcome), KA_OK);
             const std::vector<AdData*> ads = Ads(handle, vmap);
 
             // The records printed as the rows write them, each field checked on the way.
