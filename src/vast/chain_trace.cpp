@@ -98,9 +98,10 @@ void ChainTrace::EndAd(uint64_t mergeRefusals) {
 }
 
 void ChainTrace::Clear() {
-    std::string().swap(mRootError);
-    std::vector<AdTrace>().swap(mAds);
+    mRootError.clear();
+    mAds.clear();
 }
+
 
 void ChainTrace::AddErrorUrl(const char* url) {
     if (!mAds.empty() && url != nullptr && url[0] != '\0') mAds.back().errorUrls.push_back({url});

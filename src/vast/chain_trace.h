@@ -55,7 +55,7 @@ public:
     void EndAd(uint64_t mergeRefusals);
 
     const std::vector<AdTrace>& Ads() const { return mAds; }
-    // Forgets everything, memory included.
+    // Forgets everything; the list's room stays for the next Process.
     void Clear();
 
 private:

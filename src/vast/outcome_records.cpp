@@ -1,54 +1,69 @@
-// Chain outcome records. Blocks are zero-filled when allocated, counts are set with the array
-// they count, and strings are copied into slots that are null until then: a record is complete
-// enough to be freed at every step.
+// Chain outcome records. Each outcome is one block: the record, then its hops, then its Error
+// URL pointers, then every string they point to; one allocation per ad of the player's
+// document, and one release.
 #include "vast/outcome_records.h"
 
 #include <cstring>
+#include <new>
 
 namespace ka {
 
 namespace {
 
 // The allocation functions of these records; nothing else here allocates or frees.
-template <typename T>
-T* NewBlocks(size_t count) {
-    return new T[count]();
-}
+void* NewBlock(size_t bytes) { return ::operator new(bytes); }
+void FreeBlock(void* block) { ::operator delete(block); }
 
-template <typename T>
-void FreeBlocks(T* blocks) {
-    delete[] blocks;
-}
+size_t TextSize(const std::string& text) { return text.size() + 1; }
 
-char* NewText(const std::string& text) {
-    char* copy = NewBlocks<char>(text.size() + 1);
-    memcpy(copy, text.data(), text.size());
+// Copies text to *at and moves *at past it.
+char* PlaceText(const std::string& text, char*& at) {
+    char* copy = at;
+    memcpy(copy, text.c_str(), TextSize(text));
+    at += TextSize(text);
     return copy;
 }
 
-void FreeText(char* text) { FreeBlocks(text); }
-
-void FillHops(const std::vector<HopTrace>& hops, KaChainOutcome* outcome) {
-    if (hops.empty()) return;
-    outcome->hops = NewBlocks<KaChainHop>(hops.size());
-    outcome->hopCount = static_cast<uint32_t>(hops.size());
-    for (size_t i = 0; i < hops.size(); ++i) {
-        KaChainHop& hop = outcome->hops[i];
-        hop.depth = hops[i].depth;
-        hop.result = hops[i].result;
-        hop.bytes = hops[i].bytes;
-        hop.milliseconds = hops[i].milliseconds;
-        hop.onPath = hops[i].onPath ? 1 : 0;
-        hop.url = NewText(hops[i].url);
-        if (!hops[i].finalUrl.empty()) hop.finalUrl = NewText(hops[i].finalUrl);
+KaChainOutcome* NewOutcome(const AdTrace& ad) {
+    size_t bytes = sizeof(KaChainOutcome) + ad.hops.size() * sizeof(KaChainHop) +
+                   ad.errorUrls.size() * sizeof(char*);
+    for (const HopTrace& hop : ad.hops) {
+        bytes += TextSize(hop.url) + (hop.finalUrl.empty() ? 0 : TextSize(hop.finalUrl));
     }
-}
+    for (const TraceText& url : ad.errorUrls) bytes += TextSize(url.text);
 
-void FillErrorUrls(const std::vector<TraceText>& urls, KaChainOutcome* outcome) {
-    if (urls.empty()) return;
-    outcome->errorUrls = NewBlocks<char*>(urls.size());
-    outcome->errorUrlCount = static_cast<uint32_t>(urls.size());
-    for (size_t i = 0; i < urls.size(); ++i) outcome->errorUrls[i] = NewText(urls[i].text);
+    char* block = static_cast<char*>(NewBlock(bytes));
+    KaChainOutcome* outcome = new (block) KaChainOutcome();
+    outcome->ad = ad.ad;
+    outcome->state = ad.state;
+    outcome->vastError = ad.vastError;
+    outcome->reason = ad.reason;
+    char* at = block + sizeof(KaChainOutcome);
+    if (!ad.hops.empty()) {
+        outcome->hops = new (at) KaChainHop[ad.hops.size()]();
+        outcome->hopCount = static_cast<uint32_t>(ad.hops.size());
+        at += ad.hops.size() * sizeof(KaChainHop);
+    }
+    if (!ad.errorUrls.empty()) {
+        outcome->errorUrls = new (at) char*[ad.errorUrls.size()]();
+        outcome->errorUrlCount = static_cast<uint32_t>(ad.errorUrls.size());
+        at += ad.errorUrls.size() * sizeof(char*);
+    }
+    for (size_t i = 0; i < ad.hops.size(); ++i) {
+        const HopTrace& from = ad.hops[i];
+        KaChainHop& hop = outcome->hops[i];
+        hop.depth = from.depth;
+        hop.result = from.result;
+        hop.bytes = from.bytes;
+        hop.milliseconds = from.milliseconds;
+        hop.onPath = from.onPath ? 1 : 0;
+        hop.url = PlaceText(from.url, at);
+        if (!from.finalUrl.empty()) hop.finalUrl = PlaceText(from.finalUrl, at);
+    }
+    for (size_t i = 0; i < ad.errorUrls.size(); ++i) {
+        outcome->errorUrls[i] = PlaceText(ad.errorUrls[i].text, at);
+    }
+    return outcome;
 }
 
 }  // namespace
@@ -57,29 +72,15 @@ void BuildChainOutcomes(const ChainTrace& trace, KaChainOutcome** head) {
     KaChainOutcome** end = head;
     while (*end != nullptr) end = &(*end)->next;
     for (const AdTrace& ad : trace.Ads()) {
-        KaChainOutcome* outcome = NewBlocks<KaChainOutcome>(1);
-        *end = outcome;
-        end = &outcome->next;
-        outcome->ad = ad.ad;
-        outcome->state = ad.state;
-        outcome->vastError = ad.vastError;
-        outcome->reason = ad.reason;
-        FillHops(ad.hops, outcome);
-        FillErrorUrls(ad.errorUrls, outcome);
+        *end = NewOutcome(ad);
+        end = &(*end)->next;
     }
 }
 
 void ReleaseChainOutcomes(KaChainOutcome*& head) {
     while (head != nullptr) {
         KaChainOutcome* next = head->next;
-        for (uint32_t i = 0; i < head->hopCount; ++i) {
-            FreeText(head->hops[i].url);
-            FreeText(head->hops[i].finalUrl);
-        }
-        FreeBlocks(head->hops);
-        for (uint32_t i = 0; i < head->errorUrlCount; ++i) FreeText(head->errorUrls[i]);
-        FreeBlocks(head->errorUrls);
-        FreeBlocks(head);
+        FreeBlock(head);
         head = next;
     }
 }

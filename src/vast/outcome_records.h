@@ -1,5 +1,5 @@
-// The public KaChainOutcome records built from a ChainTrace, and their release. Every block they
-// own is allocated and freed by the few functions of outcome_records.cpp.
+// The public KaChainOutcome records built from a ChainTrace, and their release. Each outcome is
+// one block, allocated and freed by the two functions of outcome_records.cpp.
 #pragma once
 
 #include "ka/vmap_parser_ext.h"
@@ -7,8 +7,8 @@
 
 namespace ka {
 
-// Appends one outcome per ad of trace at the end of *head. Each record is linked in before
-// anything below it is allocated: when an allocation throws, ReleaseChainOutcomes frees all.
+// Appends one outcome per ad of trace at the end of *head, each linked in as soon as it exists:
+// when an allocation throws, ReleaseChainOutcomes frees what was built.
 void BuildChainOutcomes(const ChainTrace& trace, KaChainOutcome** head);
 // Frees the list and everything it owns; sets head to null.
 void ReleaseChainOutcomes(KaChainOutcome*& head);
