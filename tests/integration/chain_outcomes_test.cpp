@@ -50,6 +50,9 @@ TEST(ChainOutcomes, EveryRowReportsItsChain) {
     for (const auto& row : rows) {
         if (row[0] == "doc") server.Put(row[1], bodies[row[1]] = Expand(row[2], urls));
     }
+    // A redirect to w1: the hop's final URL is w1's.
+    urls["redirect"] = server.Url("/redirect?to=" + urls["w1"]);
+    bodies["redirect"] = bodies["w1"];
     for (const auto& u : urls) names[u.second] = u.first;
 
     for (const auto& row : rows) {
@@ -103,7 +106,8 @@ TEST(ChainOutcomes, EveryRowReportsItsChain) {
                     hops += (h != 0 ? ", " : "") + std::to_string(hop.depth) + " " + name + " " +
                             result + (hop.onPath != 0 ? "" : " dropped");
                     EXPECT_EQ(hop.bytes, hop.result == 0 ? bodies[name].size() : 0u) << name;
-                    EXPECT_STREQ(hop.finalUrl, hop.result == 0 ? hop.url : nullptr);
+                    const std::string reached = name == "redirect" ? urls["w1"] : hop.url;
+                    EXPECT_STREQ(hop.finalUrl, hop.result == 0 ? reached.c_str() : nullptr);
                     // Time is checked loosely: the stall waits out the deadline, nothing else.
                     EXPECT_LT(hop.milliseconds, 5000u);
                     EXPECT_GE(hop.milliseconds, name == "stall" ? 250u : 0u);
