@@ -19,8 +19,9 @@ constexpr uint32_t kFirstSlot = offsetof(VMAPParserExtAPI, GetChainOutcomes);
 template <typename Slot>
 void Fill(VMAPParserExtAPI* api, uint32_t room, Slot VMAPParserExtAPI::*slot, Slot value,
           uint32_t& filled) {
-    const uint32_t end = static_cast<uint32_t>(reinterpret_cast<const char*>(&(api->*slot)) -
-                                               reinterpret_cast<const char*>(api) + sizeof(Slot));
+    const uint32_t end = static_cast<uint32_t>(
+        reinterpret_cast<const char*>(&(api->*slot)) - reinterpret_cast<const char*>(api) +
+        sizeof(Slot));
     if (end > room) return;
     api->*slot = value;
     if (end > filled) filled = end;

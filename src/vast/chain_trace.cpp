@@ -102,7 +102,6 @@ void ChainTrace::Clear() {
     mAds.clear();
 }
 
-
 void ChainTrace::AddErrorUrl(const char* url) {
     if (!mAds.empty() && url != nullptr && url[0] != '\0') mAds.back().errorUrls.push_back({url});
 }

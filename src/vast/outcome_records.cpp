@@ -32,20 +32,22 @@ KaChainOutcome* NewOutcome(const AdTrace& ad) {
     }
     for (const TraceText& url : ad.errorUrls) bytes += TextSize(url.text);
 
+    // Plain C records: the zeroed block holds them as a C player would allocate them.
     char* block = static_cast<char*>(NewBlock(bytes));
-    KaChainOutcome* outcome = new (block) KaChainOutcome();
+    memset(block, 0, bytes);
+    KaChainOutcome* outcome = reinterpret_cast<KaChainOutcome*>(block);
     outcome->ad = ad.ad;
     outcome->state = ad.state;
     outcome->vastError = ad.vastError;
     outcome->reason = ad.reason;
     char* at = block + sizeof(KaChainOutcome);
     if (!ad.hops.empty()) {
-        outcome->hops = new (at) KaChainHop[ad.hops.size()]();
+        outcome->hops = reinterpret_cast<KaChainHop*>(at);
         outcome->hopCount = static_cast<uint32_t>(ad.hops.size());
         at += ad.hops.size() * sizeof(KaChainHop);
     }
     if (!ad.errorUrls.empty()) {
-        outcome->errorUrls = new (at) char*[ad.errorUrls.size()]();
+        outcome->errorUrls = reinterpret_cast<char**>(at);
         outcome->errorUrlCount = static_cast<uint32_t>(ad.errorUrls.size());
         at += ad.errorUrls.size() * sizeof(char*);
     }
