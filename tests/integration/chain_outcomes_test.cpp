@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <cinttypes>
+#include <cstddef>
 #include <map>
 #include <string>
 #include <vector>
@@ -120,6 +121,34 @@ TEST(ChainOutcomes, EveryRowReportsItsChain) {
             }
             EXPECT_EQ(printed, row);
         }
+    }
+}
+
+}  // namespace
+
+namespace {
+
+// The slot as a player compiled against a table that ends with it gets it, and what it lends
+// before any Process, for a null handle and after a failed Process.
+TEST(ChainOutcomes, SlotAndEmptyCases) {
+    VMAPParserExtAPI table = {};
+    table.size = offsetof(VMAPParserExtAPI, ExpandMacros);
+    auto get =
+        reinterpret_cast<KaGetVMAPParserExtAPIFn>(katest::LibrarySymbol("kaGetVMAPParserExtAPI"));
+    ASSERT_EQ(get(&table), KA_OK);
+    EXPECT_EQ(table.size, offsetof(VMAPParserExtAPI, ExpandMacros));
+    EXPECT_EQ(table.GetChainOutcomes, katest::ExtApi().GetChainOutcomes);
+    EXPECT_EQ(table.ExpandMacros, nullptr);
+
+    KaChainOutcome* outcome = static_cast<KaChainOutcome*>(katest::kUntouched);
+    EXPECT_EQ(table.GetChainOutcomes(nullptr, &outcome), KA_ERR_NULL_ARGUMENT);
+    katest::Handle handle;
+    handle.SetFlag(KA_PID_VMAP_VAST_ONLY, true);
+    EXPECT_EQ(table.GetChainOutcomes(handle.get(), nullptr), KA_OK);
+    for (const char* document : {"", "<VAST><Ad><InLine/></Ad></VAST>", "not xml"}) {
+        if (document[0] != '\0') handle.Process(std::string(document));
+        EXPECT_EQ(table.GetChainOutcomes(handle.get(), &outcome), KA_OK);
+        EXPECT_EQ(outcome != nullptr, document[0] == '<') << document;
     }
 }
 
