@@ -20,6 +20,77 @@ typedef struct KaMacroValues KaMacroValues;
 
 /* ---- Chain outcomes ---- */
 
+/* What became of each ad of the player's document once its wrapper chain was followed: one
+ * KaChainOutcome per ad, in document order (in VMAP, per ad of each inline VAST element), with
+ * every download of the chain and every Error URL along it, for the Error ping a player owes the
+ * ad servers when the chain failed. An ad that was an InLine from the start gets a record with
+ * no hops. The records belong to the handle: built by Process, released by the next Process,
+ * Reset or Close. With merging off the same outcomes are reported. */
+
+/* KaChainOutcome.state: what the chain reached. */
+#define KA_CHAIN_NOT_WRAPPED 0u /* the ad was no Wrapper in the player's document: no chain */
+#define KA_CHAIN_RESOLVED 1u    /* the chain reached an InLine ad (merged in, or nestedParser's) */
+#define KA_CHAIN_WRAPPER 2u     /* the chain stopped at a Wrapper: the ad is still a wrapper */
+/* A wrapped document gave no ad: merged, the ad has lost its wrapper data (type Wrapper, no
+ * body, no id); unmerged, it keeps them and its nestedParser holds an empty container. */
+#define KA_CHAIN_EMPTIED 3u
+
+/* KaChainOutcome.vastError: the IAB VAST error code to send to the Error URLs. */
+#define KA_VAST_ERROR_NONE 0u        /* resolved, or an InLine from the start */
+#define KA_VAST_ERROR_XML 100u       /* a wrapped document was not XML */
+#define KA_VAST_ERROR_SCHEMA 101u    /* a Wrapper without VASTAdTagURI, an Ad without a body */
+#define KA_VAST_ERROR_VERSION 102u   /* a wrapped document of a VAST version other than 2 to 4 */
+#define KA_VAST_ERROR_WRAPPER 300u   /* a download failed: connection, HTTP status, URL refused */
+#define KA_VAST_ERROR_TIMEOUT 301u   /* the deadline passed, or the player's stop flag was set */
+#define KA_VAST_ERROR_LIMIT 302u     /* the depth limit or a budget of ka/chain_limits.h */
+#define KA_VAST_ERROR_NO_AD 303u     /* a wrapped document held no ad, or nothing at all */
+#define KA_VAST_ERROR_UNDEFINED 900u /* anything else */
+
+/* KaChainOutcome.reason: why the chain ended where it did, finer than the VAST code. */
+#define KA_CHAIN_REASON_NONE 0u        /* resolved, or not wrapped */
+#define KA_CHAIN_REASON_NO_URI 1u      /* a Wrapper without (or with an empty) VASTAdTagURI: 101 */
+#define KA_CHAIN_REASON_NO_BODY 2u     /* the ad had neither InLine nor Wrapper: 101 */
+#define KA_CHAIN_REASON_URL_REFUSED 3u /* reference too long, or a scheme not allowed: 300 */
+#define KA_CHAIN_REASON_DOWNLOAD 4u    /* the download failed (see the last hop's result): 300 */
+#define KA_CHAIN_REASON_DEADLINE 5u    /* KA_PID_VMAP_DEADLINE_MS passed: 301 */
+#define KA_CHAIN_REASON_STOPPED 6u     /* the KA_PID_VMAP_STOP_FLAG flag was set: 301 */
+#define KA_CHAIN_REASON_NOT_XML 7u     /* the wrapped document could not be loaded: 100 */
+#define KA_CHAIN_REASON_VERSION 8u     /* an unsupported version and no usable ad: 102 */
+#define KA_CHAIN_REASON_NO_AD 9u       /* an empty download or a document without ads: 303 */
+#define KA_CHAIN_REASON_DEPTH 10u      /* the wrapper depth limit (ten hops): 302 */
+#define KA_CHAIN_REASON_FETCHES 11u    /* KA_VMAP_FETCHES_PER_AD spent: 302 */
+#define KA_CHAIN_REASON_BYTES 12u      /* KA_PID_VMAP_FETCH_BYTES spent: 302 */
+/* Resolved, but the merge share of KA_VMAP_MERGE_BYTES_FLOOR cut the copies of the wrappers'
+ * tracking: the ad plays, without some of its wrappers' tracking: 302. */
+#define KA_CHAIN_REASON_MERGE_SHARE 13u
+
+/* One download of a chain. */
+typedef struct KaChainHop {
+    char* url;             /* the URL asked for, resolved against its document; never null */
+    char* finalUrl;        /* the URL reached after redirects; null when the download failed */
+    uint32_t depth;        /* 1: named by the player's document, 2: by the document of depth 1 */
+    uint32_t result;       /* the download's result code (ka/result_codes.h); 0: downloaded */
+    uint64_t bytes;        /* bytes read; of a failed download what arrived, mostly 0 */
+    uint32_t milliseconds; /* how long the download took */
+    uint32_t onPath;       /* 1 when the hop leads to the ad the player got; 0: fan-out dropped */
+} KaChainHop;
+
+/* The outcome of one ad's chain (typedef above). Strings and arrays are owned by the handle. */
+struct KaChainOutcome {
+    AdData* ad;         /* the ad of the player's records (the node the merge keeps); not owned */
+    uint32_t state;     /* KA_CHAIN_* */
+    uint32_t vastError; /* KA_VAST_ERROR_*: 0 when resolved (302 when the merge share cut) */
+    uint32_t reason;    /* KA_CHAIN_REASON_* */
+    uint32_t hopCount;  /* records in hops; at most KA_VMAP_FETCHES_PER_AD */
+    KaChainHop* hops;   /* every download of the chain, in pre-order (a tree by depth); or null */
+    uint32_t errorUrlCount; /* strings in errorUrls */
+    /* The Error URLs along the chain, outermost first: the player's document's root <Error> and
+     * the ad's own, then each wrapped document's root <Error> and its first ad's, down to the
+     * InLine's; copies taken before the merge released them; or null. */
+    char** errorUrls;
+    struct KaChainOutcome* next; /* the next ad's outcome, or null */
+};
+
 /* ---- Macro expansion ---- */
 
 /* What a numeric field of KaMacroValues holds when the player does not know the value: the

@@ -4,8 +4,15 @@
 
 #include "ka/result_codes.h"
 #include "ka/vmap_parser_ext.h"
+#include "vmap/vmap_parser.h"
 
 namespace {
+
+// Lends records and allocates nothing: no exception to guard against.
+uint32_t GetChainOutcomes(void* handle, KaChainOutcome** out) {
+    if (handle == nullptr) return KA_ERR_NULL_ARGUMENT;
+    return static_cast<CVMAPParser*>(handle)->GetChainOutcomes(out);
+}
 
 constexpr uint32_t kFirstSlot = offsetof(VMAPParserExtAPI, GetChainOutcomes);
 
@@ -25,6 +32,7 @@ uint32_t kaGetVMAPParserExtAPI(VMAPParserExtAPI* api) {
     if (api == nullptr || api->size < kFirstSlot + sizeof(void*)) return KA_ERR_NULL_ARGUMENT;
     const uint32_t room = api->size;
     uint32_t filled = kFirstSlot;
+    Fill(api, room, &VMAPParserExtAPI::GetChainOutcomes, &GetChainOutcomes, filled);
     Fill(api, room, &VMAPParserExtAPI::ExpandMacros, &kaExpandVASTMacros, filled);
     api->size = filled;
     return KA_OK;

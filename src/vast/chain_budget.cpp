@@ -20,6 +20,7 @@ bool ChainBudget::TakeMergeBytes(size_t bytes) {
         mergeBytes += bytes;
         return true;
     }
+    ++mergeRefusals;
     if (!mergeCapLogged) {
         mergeCapLogged = true;
         kalogPrint_ConstStr0x010d0000(

@@ -12,12 +12,15 @@
 
 namespace ka {
 
+class ChainTrace;
+
 // What one Process may still spend, over every chain it starts.
 struct ChainBudget {
     uint64_t fetchBytesLeft;  // bytes of wrapped documents still allowed
     uint64_t deadline;        // ka::MonotonicMs() at which downloads end; 0: none
     uint64_t parsedBytes;     // the caller's document and every fetched one
     uint64_t mergeBytes;      // what merges have copied so far
+    uint64_t mergeRefusals;   // merge copies refused for want of share
     bool mergeCapLogged;
 
     static ChainBudget Start(uint64_t fetchBytes, uint32_t deadlineMs);
@@ -41,11 +44,17 @@ struct ChainContext {
     ChainBudget* budget;
     // Where the document being read came from, for its relative references; null: unknown.
     const char* documentUrl;
+    // Where the chain's outcomes are recorded; null: nowhere (a parser used on its own).
+    ChainTrace* trace;
+    // Whether the document being read leads to the ad the player gets: the first ad of each
+    // wrapped document takes the wrapper's place, the others are dropped by the merge.
+    bool onPath;
 
     static ChainContext Start(KA_BOOL mergeWrappers, KA_BOOL* stopFlag, char* workPath,
                               ChainBudget* budget, const char* documentUrl) {
         return ChainContext{mergeWrappers, stopFlag, KA_VMAP_FETCHES_PER_AD,
-                            workPath,      budget,   documentUrl};
+                            workPath,      budget,   documentUrl,
+                            nullptr,       false};
     }
 
     // Spends one fetch; false when the ad's budget is used up.

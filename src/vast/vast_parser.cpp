@@ -4,7 +4,9 @@
 
 #include "ka/result_codes.h"
 #include "ka/vast_extension.h"
+#include "ka/vmap_parser_ext.h"
 #include "platform/limits.h"
+#include "vast/chain_trace.h"
 
 CVASTParser::CVASTParser()
     : mVastAdData(),
@@ -86,6 +88,15 @@ unsigned int CVASTParser::ParseVASTNodeInChain(void* node, bool ownsDocument, bo
     ResetTails();
     LoadTag(node, &mVastAdData, &CVASTParser::LoadVASTTag);
     ResetTails();
+    // Taken before the walk: the merges rewrite the ads and move the root <Error>.
+    if (chain.trace != nullptr) {
+        if (mVastAdData.depth == 0) {
+            chain.trace->BeginDocument(mVastAdData.errorUrl);
+        } else if (chain.onPath) {
+            chain.trace->PathDocument(mVastAdData.errorUrl, mVastAdData.firstAd,
+                                      ReadsVersion(node));
+        }
+    }
     // The document and the module go before any wrapper is fetched: along a chain of wrappers
     // only one fetched document is loaded at a time.
     if (ownsDocument) Close();
@@ -96,22 +107,44 @@ unsigned int CVASTParser::ParseVASTNodeInChain(void* node, bool ownsDocument, bo
 void CVASTParser::ForgetVastAdData() { mVastAdData = VastAdData(); }
 
 void CVASTParser::WalkWrappers(bool mergeWrappers, ka::ChainContext& chain) {
+    const bool top = mVastAdData.depth == 0;
     for (AdData* ad = mVastAdData.firstAd; ad != nullptr;) {
         // The wrapper chain rewrites the node in place, so the next one is taken first.
         AdData* next = ad->next;
+        if (top && chain.trace != nullptr) chain.trace->BeginAd(ad, chain.budget->mergeRefusals);
         if (ad->type == AD_TYPE_WRAPPER && ad->body != nullptr) {
-            if (mVastAdData.depth >= mMaxDepth) break;
+            ka::ChainTrace* trace = OnPath(chain, ad) ? chain.trace : nullptr;
+            if (mVastAdData.depth >= mMaxDepth) {
+                if (trace != nullptr) trace->End(KA_CHAIN_WRAPPER, KA_CHAIN_REASON_DEPTH);
+                break;
+            }
             // Each ad of the caller's document has a fetch budget of its own: an ad that loops
             // or fans out spends only its own.
-            if (mVastAdData.depth == 0) chain.fetchesLeft = KA_VMAP_FETCHES_PER_AD;
+            if (top) chain.fetchesLeft = KA_VMAP_FETCHES_PER_AD;
             // A failed fetch leaves no nested parser, and the merge then leaves the ad as read.
             if (static_cast<AdWrapper*>(ad->body)->vastAdTagUri != nullptr) {
                 FetchWrapper(ad, chain);
+            } else if (trace != nullptr) {
+                trace->End(KA_CHAIN_WRAPPER, KA_CHAIN_REASON_NO_URI);
             }
             if (mergeWrappers) MergeWrapper(ad);
         }
+        if (top && chain.trace != nullptr) chain.trace->EndAd(chain.budget->mergeRefusals);
         ad = next;
     }
+}
+
+bool CVASTParser::OnPath(const ka::ChainContext& chain, const AdData* ad) const {
+    return chain.trace != nullptr &&
+           (mVastAdData.depth == 0 || (chain.onPath && ad == mVastAdData.firstAd));
+}
+
+bool CVASTParser::ReadsVersion(void* root) {
+    char* value = nullptr;
+    int length = 0;
+    if (!ReadAttribute(root, "version", &value, length)) return true;
+    // "2.0" to "4.3": what matters is the major version.
+    return length >= 1 && value[0] >= '2' && value[0] <= '4' && (length == 1 || value[1] == '.');
 }
 
 unsigned int CVASTParser::LoadTag(void* node, void* target, TagHandler handler) {

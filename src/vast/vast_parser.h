@@ -126,6 +126,11 @@ private:
     unsigned int LoadExtensions(void* node, CAdExtensions*& extensions);
     // Wrapper ads of mVastAdData, in list order, while this document is above the depth limit.
     void WalkWrappers(bool mergeWrappers, ka::ChainContext& chain);
+    // Whether the chain records an outcome for ad: every ad of the caller's document, and the
+    // first ad of each wrapped document on the path.
+    bool OnPath(const ka::ChainContext& chain, const AdData* ad) const;
+    // Whether the root declares a VAST version from 2 to 4, or none.
+    bool ReadsVersion(void* root);
     // The URL to fetch for a wrapper's reference, seen from documentUrl (may be null) into out
     // (kUrlSize bytes); false when it does not fit or is not allowed from that document.
     static bool ResolveWrappedUrl(const char* reference, const char* documentUrl, char* out);

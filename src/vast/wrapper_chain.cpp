@@ -10,7 +10,9 @@
 
 #include "ka/result_codes.h"
 #include "ka/uri.h"
+#include "ka/vmap_parser_ext.h"
 #include "net/download.h"
+#include "vast/chain_trace.h"
 #include "vast/vast_parser.h"
 #include "vast/vast_release.h"
 #include "xml/record_lists.h"
@@ -27,6 +29,9 @@ AdLinear* LinearOf(AdCreative* creative) {
                                                                        : nullptr;
 }
 
+// The caller's flag, which another of its threads may set while the chain runs.
+bool IsSet(const KA_BOOL* flag) { return *static_cast<const volatile KA_BOOL*>(flag) != 0; }
+
 bool HasClicks(const AdVideoClicks* clicks) {
     return clicks != nullptr &&
            (clicks->clickTrackings != nullptr || clicks->customClicks != nullptr);
@@ -38,30 +43,55 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     if (ad == nullptr || ad->body == nullptr || ad->type != AD_TYPE_WRAPPER) return KA_OK;
     AdWrapper* wrapper = static_cast<AdWrapper*>(ad->body);
     ka::ChainBudget& budget = *chain.budget;
-    if (budget.DeadlinePassed() || budget.fetchBytesLeft == 0) return KA_ERR_LOAD_FAILED;
+    const bool onPath = OnPath(chain, ad);
+    // Records why the ad's chain ends here, when the ad leads to what the player gets.
+    auto refuse = [&](uint32_t state, uint32_t reason) {
+        if (onPath) chain.trace->End(state, reason);
+        return KA_ERR_LOAD_FAILED;
+    };
+    if (budget.DeadlinePassed()) return refuse(KA_CHAIN_WRAPPER, KA_CHAIN_REASON_DEADLINE);
+    if (budget.fetchBytesLeft == 0) return refuse(KA_CHAIN_WRAPPER, KA_CHAIN_REASON_BYTES);
     char url[ka::kUrlSize];
     if (!ResolveWrappedUrl(wrapper->vastAdTagUri, chain.documentUrl, url)) {
-        return KA_ERR_LOAD_FAILED;
+        const bool empty = wrapper->vastAdTagUri == nullptr || wrapper->vastAdTagUri[0] == '\0';
+        return refuse(KA_CHAIN_WRAPPER,
+                      empty ? KA_CHAIN_REASON_NO_URI : KA_CHAIN_REASON_URL_REFUSED);
     }
 
     // Without a caller's flag (a VAST element of a VMAP document) downloads get one that stays
     // false: the download needs a flag to read.
     KA_BOOL neverStop = 0;
     KA_BOOL* stopFlag = chain.stopFlag != nullptr ? chain.stopFlag : &neverStop;
-    if (!chain.TakeFetch()) return KA_ERR_LOAD_FAILED;
+    if (!chain.TakeFetch()) return refuse(KA_CHAIN_WRAPPER, KA_CHAIN_REASON_FETCHES);
     unsigned char* buffer = nullptr;
     uint32_t size = 0;
     ka::DocumentFetch fetch = {budget.fetchBytesLeft, budget.deadline, {}, false};
+    const uint64_t start = ka::MonotonicMs();
     const uint32_t downloaded =
         ka::DownloadDocument(url, &buffer, &size, chain.workPath, stopFlag, &fetch);
     // Owned from here on: the allocations below may fail.
     std::unique_ptr<unsigned char[]> owned(buffer);
     // Memory that ran out fails the whole Process, not just this wrapper.
     if (downloaded == KA_ERR_NO_MEMORY) throw std::bad_alloc();
+    if (chain.trace != nullptr) {
+        const bool ok = downloaded == 0 && buffer != nullptr;
+        const uint64_t ms = ka::MonotonicMs() - start;
+        chain.trace->AddHop({url, ok ? (fetch.finalUrl[0] != '\0' ? fetch.finalUrl : url) : "",
+                             mVastAdData.depth + 1, downloaded, size,
+                             static_cast<uint32_t>(ms > UINT32_MAX ? UINT32_MAX : ms), onPath});
+    }
     // A document larger than what is left spends the byte budget: later wrappers are not
     // fetched, rather than downloaded only to be dropped.
     if (fetch.overLimit) budget.fetchBytesLeft = 0;
-    if (downloaded != 0 || size == 0 || buffer == nullptr) return KA_ERR_LOAD_FAILED;
+    if (fetch.overLimit) return refuse(KA_CHAIN_WRAPPER, KA_CHAIN_REASON_BYTES);
+    if (downloaded != 0 || size == 0 || buffer == nullptr) {
+        if (IsSet(stopFlag)) return refuse(KA_CHAIN_WRAPPER, KA_CHAIN_REASON_STOPPED);
+        if (downloaded == KA_ERR_DOWNLOAD_TIMEOUT) {
+            return refuse(KA_CHAIN_WRAPPER, KA_CHAIN_REASON_DEADLINE);
+        }
+        return refuse(KA_CHAIN_WRAPPER,
+                      downloaded != 0 ? KA_CHAIN_REASON_DOWNLOAD : KA_CHAIN_REASON_NO_AD);
+    }
     budget.fetchBytesLeft -= size;
 
     CVASTParser* nested = new CVASTParser();
@@ -74,10 +104,12 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     // relative references are seen from where the document was finally fetched.
     ka::ChainContext inner = chain;
     inner.documentUrl = fetch.finalUrl[0] != '\0' ? fetch.finalUrl : url;
+    inner.onPath = onPath;
     const unsigned int result = nested->ProcessInChain(buffer, size, inner);
     chain.fetchesLeft = inner.fetchesLeft;
     owned.reset();
     nested->Close();
+    if (result != KA_OK) refuse(KA_CHAIN_EMPTIED, KA_CHAIN_REASON_NOT_XML);
     return result;
 }
 

@@ -6,6 +6,7 @@
 #include "ka/result_codes.h"
 #include "ka/vmap_parser_api.h"
 #include "platform/limits.h"
+#include "vast/outcome_records.h"
 #include "vast/vast_parser.h"
 #include "vast/vast_release.h"
 #include "vmap/vmap_values.h"
@@ -30,6 +31,8 @@ CVMAPParser::CVMAPParser()
       mBaseUrl(),
       mBudget(ka::ChainBudget::Start(KA_VMAP_DEFAULT_FETCH_BYTES, 0)),
       mInlineChain(ka::ChainContext::Start(1, nullptr, nullptr, &mBudget, nullptr)),
+      mTrace(),
+      mOutcomes(nullptr),
       mBreakTail(),
       mTrackingTail(),
       mBuiltVastOnly(0) {}
@@ -60,6 +63,8 @@ void CVMAPParser::ReleaseAll() {
     mContentUri = nullptr;
     ReleaseAdInfo();
     DestroyVASTParser();
+    ka::ReleaseChainOutcomes(mOutcomes);
+    mTrace.Clear();
 }
 
 unsigned int CVMAPParser::Process(void* buffer, unsigned int size) {
@@ -72,12 +77,16 @@ unsigned int CVMAPParser::Process(void* buffer, unsigned int size) {
         // Without a flag of the caller's the chain's downloads get one that stays false.
         ka::ChainContext chain = ka::ChainContext::Start(mMergeWrappers != 0 ? 1 : 0, mStopFlag,
                                                          mWorkPath, &mBudget, baseUrl);
-        return mVastParser->ProcessInChain(buffer, size, chain);
+        chain.trace = &mTrace;
+        const unsigned int result = mVastParser->ProcessInChain(buffer, size, chain);
+        PublishOutcomes();
+        return result;
     }
     // The VAST elements of one document share the Process's budget. Their downloads get no stop
     // flag: the caller's is for VAST-only mode. The merge setting decides only what becomes of
     // the elements' own wrappers: nested parsers always merge.
     mInlineChain = ka::ChainContext::Start(1, nullptr, mWorkPath, &mBudget, baseUrl);
+    mInlineChain.trace = &mTrace;
     mBudget.parsedBytes = size;
     if (buffer == nullptr || size == 0 || size > static_cast<unsigned int>(INT_MAX)) {
         return KA_ERR_LOAD_FAILED;
@@ -90,6 +99,17 @@ unsigned int CVMAPParser::Process(void* buffer, unsigned int size) {
     if (root == nullptr) return KA_ERR_LOAD_FAILED;
     // Any root name is accepted: documents differ in how they spell it.
     LoadTag(root, &mAdInfo, &CVMAPParser::LoadVMAPTag);
+    PublishOutcomes();
+    return KA_OK;
+}
+
+void CVMAPParser::PublishOutcomes() {
+    ka::BuildChainOutcomes(mTrace, &mOutcomes);
+    mTrace.Clear();
+}
+
+unsigned int CVMAPParser::GetChainOutcomes(KaChainOutcome** out) {
+    if (out != nullptr) *out = mOutcomes;
     return KA_OK;
 }
 

@@ -9,8 +9,10 @@
 
 #include "ka/types.h"
 #include "ka/vast_records.h"
+#include "ka/vmap_parser_ext.h"
 #include "ka/vmap_records.h"
 #include "vast/chain_context.h"
+#include "vast/chain_trace.h"
 #include "xml/record_lists.h"
 #include "xml/xml_document.h"
 
@@ -39,6 +41,10 @@ public:
     // The KA_PID_VMAP_* parameters; unknown identifiers are ignored; always 0.
     virtual unsigned int SetParam(unsigned int id, void* value);
     virtual unsigned int GetParam(unsigned int id, void* value);
+
+    // Writes the chain outcomes of the last Process (null when it read no ad) when out is not
+    // null; always 0.
+    unsigned int GetChainOutcomes(KaChainOutcome** out);
 
     // Close without unloading the module: the handle stays open; always 0.
     unsigned int Reset();
@@ -76,6 +82,8 @@ public:
 private:
     // Everything Close does before unloading the module.
     void ReleaseAll();
+    // Turns the trace of the Process that ends into the records GetChainOutcomes lends.
+    void PublishOutcomes();
     void ReadContentUri(void* extensions);
     // Frees the VAST records of an ad source's block, then the block.
     void ReleaseVastBlock(VastAdData* block);
@@ -87,6 +95,9 @@ private:
     ka::ChainBudget mBudget;
     // The chain of the VAST elements of the last VMAP Process, started by that Process.
     ka::ChainContext mInlineChain;
+    // What the chains of the running Process did, and the records made of it when it ended.
+    ka::ChainTrace mTrace;
+    KaChainOutcome* mOutcomes;
     // The last records appended, so that long lists are filled in linear time.
     ka::ListTail<AdBreak> mBreakTail;
     ka::ListTail<AdBreakTracking> mTrackingTail;

@@ -124,6 +124,13 @@ TEST_F(ChainLimits, MergeCopiesStopAtTheirShare) {
     EXPECT_GT(copied + sizeof(AdTracking) + 8, share) << "the copies fill their share";
     // The impressions are merged before the creatives and fit.
     EXPECT_STREQ(body->impressions->next->url, "imp-w");
+    // The ad plays; its outcome tells that its wrapper's tracking was cut.
+    KaChainOutcome* outcome = nullptr;
+    katest::ExtApi().GetChainOutcomes(handle_.get(), &outcome);
+    ASSERT_NE(outcome, nullptr);
+    EXPECT_EQ(outcome->state, KA_CHAIN_RESOLVED);
+    EXPECT_EQ(outcome->reason, KA_CHAIN_REASON_MERGE_SHARE);
+    EXPECT_EQ(outcome->vastError, KA_VAST_ERROR_LIMIT);
 }
 
 // References seen from the document that names them; what came over the network may name only

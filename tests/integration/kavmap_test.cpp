@@ -90,6 +90,14 @@ TEST(Kavmap, PrintsTheRecords) {
           "  impression: http://imp.test/\\x1b[2J\\x08?q="}},
         {"--vast " + url, "/dev/null", "",
          {"VAST: 1 ads, depth 0, error URL -\nad 1: id outer, sequence 0, Wrapper\n"}},
+        {"--trace --vast " + Data(chain + "chain_failures.xml"), "/dev/null", "",
+         {"chain outcomes:\n  ad 1 (id no-uri): wrapper, VAST error 101 (a Wrapper without "
+          "VASTAdTagURI)\n    error URL: err-w0\n  ad 2 (id next-no-uri): not wrapped",
+          "  ad 7 (id -): emptied, VAST error 100 (the document is not XML)\n    file://localhost"}},
+        {"--json --trace --vast " + Data(chain + "chain_failures.xml"), "/dev/null", "",
+         {"\"chainOutcomes\": [\n    {\n      \"adId\": \"no-uri\",\n      \"state\": 2,\n"
+          "      \"vastError\": 101,\n      \"reason\": 1,\n      \"hops\": [],\n"
+          "      \"errorUrls\": [\n        \"err-w0\"\n      ]\n    },\n"}},
         // clang-format on
     };
     for (const auto& c : kCases) {

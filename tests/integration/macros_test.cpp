@@ -111,15 +111,10 @@ TEST(Macros, CacheBustingNullsAndTable) {
     EXPECT_EQ(Expand()("x", nullptr, a, 0, &got), KA_ERR_BUFFER_TOO_SMALL);
     EXPECT_EQ(got, 2u);
 
-    auto entry =
-        reinterpret_cast<KaGetVMAPParserExtAPIFn>(katest::LibrarySymbol("kaGetVMAPParserExtAPI"));
-    VMAPParserExtAPI api = {};
-    api.size = sizeof(api);
-    ASSERT_EQ(entry(&api), KA_OK);
-    EXPECT_EQ(api.ExpandMacros, Expand());
+    EXPECT_EQ(katest::ExtApi().ExpandMacros, Expand());
     KaMacroValues values = KA_MACRO_VALUES_INIT;
     values.errorCode = 405;
-    ASSERT_EQ(api.ExpandMacros("e=[ERRORCODE]", &values, a, sizeof(a), &got), KA_OK);
+    ASSERT_EQ(katest::ExtApi().ExpandMacros("e=[ERRORCODE]", &values, a, sizeof(a), &got), KA_OK);
     EXPECT_STREQ(a, "e=405");
 }
 

@@ -29,6 +29,18 @@ const VMAPParserAPI& Api() {
     return api;
 }
 
+const VMAPParserExtAPI& ExtApi() {
+    static VMAPParserExtAPI api = [] {
+        VMAPParserExtAPI table = {};
+        table.size = sizeof(table);
+        auto get =
+            reinterpret_cast<KaGetVMAPParserExtAPIFn>(LibrarySymbol("kaGetVMAPParserExtAPI"));
+        if (get == nullptr || get(&table) != KA_OK) abort();
+        return table;
+    }();
+    return api;
+}
+
 namespace {
 
 // The same file the library loads, hence the same instance; it stays loaded.

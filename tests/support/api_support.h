@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "ka/vmap_parser_api.h"
+#include "ka/vmap_parser_ext.h"
 
 namespace katest {
 
@@ -14,6 +15,8 @@ void* const kUntouched = reinterpret_cast<void*>(0x5a5a);
 
 // The library from KA_LIB_PATH, loaded once per process, and its table.
 const VMAPParserAPI& Api();
+// The second table, filled at its full size.
+const VMAPParserExtAPI& ExtApi();
 void* LibrarySymbol(const char* name);
 
 // Lets the source-IO module instance the library uses read local files, so that wrapped

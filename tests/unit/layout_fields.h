@@ -82,7 +82,16 @@
     X(KaMacroValues, blockedAdCategories, 304, 8) X(KaMacroValues, apiFrameworks, 312, 8) \
     X(KaMacroValues, extensions, 320, 8) X(KaMacroValues, mediaMime, 328, 8) \
     X(KaMacroValues, vastVersions, 336, 8) X(KaMacroValues, verificationVendors, 344, 8) \
-    X(KaMacroValues, omidPartner, 352, 8)
+    X(KaMacroValues, omidPartner, 352, 8) \
+    X(KaChainHop, url, 0, 8) X(KaChainHop, finalUrl, 8, 8) X(KaChainHop, depth, 16, 4) \
+    X(KaChainHop, result, 20, 4) X(KaChainHop, bytes, 24, 8) X(KaChainHop, milliseconds, 32, 4) \
+    X(KaChainHop, onPath, 36, 4) \
+    X(KaChainOutcome, ad, 0, 8) X(KaChainOutcome, state, 8, 4) X(KaChainOutcome, vastError, 12, 4) \
+    X(KaChainOutcome, reason, 16, 4) X(KaChainOutcome, hopCount, 20, 4) \
+    X(KaChainOutcome, hops, 24, 8) X(KaChainOutcome, errorUrlCount, 32, 4) \
+    X(KaChainOutcome, errorUrls, 40, 8) X(KaChainOutcome, next, 48, 8) \
+    X(VMAPParserExtAPI, size, 0, 4) X(VMAPParserExtAPI, GetChainOutcomes, 8, 8) \
+    X(VMAPParserExtAPI, ExpandMacros, 16, 8)
 
 /* X(record, size) */
 #define KA_LAYOUT_SIZES(X) \
@@ -90,7 +99,8 @@
     X(AdCreative, 136) X(AdLinear, 96) X(AdVideoClicks, 56) X(AdClick, 24) X(AdMediaFile, 72) \
     X(AdTracking, 40) X(AdParameters, 8) X(AdIcon, 8) X(AdInfo, 16) X(AdBreak, 72) \
     X(AdSource, 40) X(AdBreakTracking, 24) X(VMAPParserAPI, 64) \
-    X(KaMacroValues, 360)
+    X(KaMacroValues, 360) \
+    X(KaChainHop, 40) X(KaChainOutcome, 56) X(VMAPParserExtAPI, 24)
 
 /* X(constant, value) */
 #define KA_LAYOUT_CONSTANTS(X) \
@@ -107,7 +117,18 @@
     X(KA_PID_VMAP_MERGE_WRAPPERS, 0x44000003u) X(KA_PID_VMAP_STOP_FLAG, 0x44000004u) \
     X(KA_ERR_NULL_ARGUMENT, 0x9100100bu) X(KA_ERR_LOAD_FAILED, 0x91001000u) \
     X(KA_ERR_MODULE_NOT_LOADED, 0x90000001u) \
-    X(KA_ERR_BUFFER_TOO_SMALL, 0x91003001u)
+    X(KA_ERR_BUFFER_TOO_SMALL, 0x91003001u) \
+    X(KA_CHAIN_NOT_WRAPPED, 0u) X(KA_CHAIN_RESOLVED, 1u) X(KA_CHAIN_WRAPPER, 2u) \
+    X(KA_CHAIN_EMPTIED, 3u) X(KA_VAST_ERROR_NONE, 0u) X(KA_VAST_ERROR_XML, 100u) \
+    X(KA_VAST_ERROR_SCHEMA, 101u) X(KA_VAST_ERROR_VERSION, 102u) X(KA_VAST_ERROR_WRAPPER, 300u) \
+    X(KA_VAST_ERROR_TIMEOUT, 301u) X(KA_VAST_ERROR_LIMIT, 302u) X(KA_VAST_ERROR_NO_AD, 303u) \
+    X(KA_VAST_ERROR_UNDEFINED, 900u) X(KA_CHAIN_REASON_NONE, 0u) X(KA_CHAIN_REASON_NO_URI, 1u) \
+    X(KA_CHAIN_REASON_NO_BODY, 2u) X(KA_CHAIN_REASON_URL_REFUSED, 3u) \
+    X(KA_CHAIN_REASON_DOWNLOAD, 4u) X(KA_CHAIN_REASON_DEADLINE, 5u) \
+    X(KA_CHAIN_REASON_STOPPED, 6u) X(KA_CHAIN_REASON_NOT_XML, 7u) \
+    X(KA_CHAIN_REASON_VERSION, 8u) X(KA_CHAIN_REASON_NO_AD, 9u) X(KA_CHAIN_REASON_DEPTH, 10u) \
+    X(KA_CHAIN_REASON_FETCHES, 11u) X(KA_CHAIN_REASON_BYTES, 12u) \
+    X(KA_CHAIN_REASON_MERGE_SHARE, 13u)
 /* clang-format on */
 
 /* One measured item as the C compiler sees it: a field (offset, size), a record's sizeof (offset

@@ -14,6 +14,7 @@
 #include "ka/chain_limits.h"
 #include "ka/download.h"
 #include "ka/vmap_parser_api.h"
+#include "ka/vmap_parser_ext.h"
 #include "printer.h"
 #include "result_text.h"
 #include "source_io_api.h"
@@ -27,6 +28,7 @@ struct Options {
     bool vastOnly = false;
     bool merge = true;
     bool json = false;
+    bool trace = false;                 // print each ad's wrapper chain after the records
     unsigned long timeoutSeconds = 10;  // every download of the Process together; 0: none
     std::string baseUrl;                // where the document came from
     std::string modulesDir;
@@ -36,12 +38,13 @@ struct Options {
 
 int Usage() {
     fputs(
-        "usage: kavmap [--vast] [--no-merge] [--json] [--timeout SECONDS] [--modules DIR]\n"
-        "              [--lib PATH] DOCUMENT\n"
+        "usage: kavmap [--vast] [--no-merge] [--json] [--trace] [--timeout SECONDS]\n"
+        "              [--modules DIR] [--lib PATH] DOCUMENT\n"
         "  DOCUMENT     a VMAP file, - for standard input, or an http(s) URL\n"
         "  --vast       read DOCUMENT as a bare VAST document\n"
         "  --no-merge   do not merge wrapper ads into the ads they lead to\n"
         "  --json       print the records as JSON\n"
+        "  --trace      also print each ad's wrapper chain: downloads, outcome, Error URLs\n"
         "  --timeout    seconds all downloads of wrapped documents may take (default 10, 0: none)\n"
         "  --modules    folder of the platform modules (default: ../modules next to kavmap)\n"
         "  --lib        the parser library (default: ../lib/libkaVMAPParser.so next to kavmap)\n",
@@ -70,6 +73,8 @@ int ParseArguments(int argc, char** argv, Options& options) {
             options.merge = false;
         } else if (arg == "--json") {
             options.json = true;
+        } else if (arg == "--trace") {
+            options.trace = true;
         } else if (arg == "--timeout") {
             char* end = nullptr;
             if (i + 1 >= argc) return Usage();
@@ -223,7 +228,8 @@ bool FetchDocument(void* library, SourceModule& module, const std::string& url,
     return true;
 }
 
-int Run(const Options& options, const VMAPParserAPI& api, std::vector<char>& document) {
+int Run(const Options& options, const VMAPParserAPI& api, const VMAPParserExtAPI& ext,
+        std::vector<char>& document) {
     std::string workPath = options.modulesDir;  // kept alive until Close, as the library asks
     void* handle = nullptr;
     uint32_t result = api.Open(&handle, &workPath[0]);
@@ -249,7 +255,13 @@ int Run(const Options& options, const VMAPParserAPI& api, std::vector<char>& doc
         return 1;
     }
 
-    const ProcessResult records = ReadResult(api, handle, options.vastOnly);
+    ProcessResult records = ReadResult(api, handle, options.vastOnly);
+    KaChainOutcome* outcomes = nullptr;
+    records.trace = options.trace;
+    if (options.trace && ext.GetChainOutcomes != nullptr) {
+        ext.GetChainOutcomes(handle, &outcomes);
+    }
+    records.outcomes = outcomes;
     if (options.json) {
         PrintJson(stdout, records);
     } else {
@@ -282,6 +294,12 @@ int main(int argc, char** argv) {
     }
     VMAPParserAPI api = {};
     getApi(&api);
+    // The second table, for --trace; a library without it shows no chains.
+    VMAPParserExtAPI ext = {};
+    ext.size = sizeof(ext);
+    auto getExt =
+        reinterpret_cast<KaGetVMAPParserExtAPIFn>(dlsym(library, "kaGetVMAPParserExtAPI"));
+    if (getExt == nullptr || getExt(&ext) != KA_OK) ext = VMAPParserExtAPI();
 
     // Wrapped documents are fetched through the same module; without it they just fail.
     SourceModule module(options.modulesDir);
@@ -307,7 +325,7 @@ int main(int argc, char** argv) {
             options.baseUrl = std::string("file://localhost") + file;
         }
     }
-    const int status = Run(options, api, document);
+    const int status = Run(options, api, ext, document);
     dlclose(library);
     return status;
 }

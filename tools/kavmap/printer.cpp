@@ -2,8 +2,10 @@
 
 #include <cinttypes>
 #include <cstdlib>
+#include <cstring>
 
 #include "ka/result_codes.h"
+#include "result_text.h"
 
 namespace {
 
@@ -641,6 +643,66 @@ void PrintTree(FILE* out, const ProcessResult& result) {
     PrintVast(out, result.vastOnly ? 0 : 1, *result.vastAdData, result, 0);
 }
 
+// Each ad's chain: its outcome, its downloads as a tree (indented by depth), its Error URLs.
+void PrintOutcomes(FILE* out, const KaChainOutcome* outcomes) {
+    fputs("chain outcomes:\n", out);
+    ForEach(outcomes, [out](const KaChainOutcome& o, uint32_t i) {
+        fprintf(out, "  ad %" PRIu32 " (id %s): %s, VAST error %" PRIu32 " (%s)\n", i + 1,
+                OrDash(o.ad != nullptr ? o.ad->id : nullptr), ChainStateText(o.state), o.vastError,
+                ChainReasonText(o.reason));
+        for (uint32_t h = 0; h < o.hopCount && o.hops != nullptr; ++h) {
+            const KaChainHop& hop = o.hops[h];
+            Indent(out, 1 + static_cast<int>(hop.depth < 16 ? hop.depth : 16));
+            fprintf(out, "%s%s", hop.onPath != 0 ? "" : "(dropped) ", OrDash(hop.url));
+            if (hop.finalUrl != nullptr && (hop.url == nullptr || strcmp(hop.url, hop.finalUrl)))
+                fprintf(out, " -> %s", hop.finalUrl);
+            fprintf(out, ": 0x%08" PRIx32 " (%s), %" PRIu64 " bytes, %" PRIu32 " ms\n", hop.result,
+                    ResultText(hop.result), hop.bytes, hop.milliseconds);
+        }
+        for (uint32_t e = 0; e < o.errorUrlCount && o.errorUrls != nullptr; ++e) {
+            fprintf(out, "    error URL: %s\n", OrDash(o.errorUrls[e]));
+        }
+    });
+}
+
+void JsonOutcomes(FILE* out, const KaChainOutcome* outcomes) {
+    fputs(",\n  \"chainOutcomes\": ", out);
+    JsonBlock list(out, 1, '[');
+    ForEach(outcomes, [out, &list](const KaChainOutcome& o, uint32_t) {
+        list.Item();
+        JsonBlock a(out, list.Inner(), '{');
+        JsonKeyString(out, a, "adId", o.ad != nullptr ? o.ad->id : nullptr);
+        JsonKeyU64(out, a, "state", o.state);
+        JsonKeyU64(out, a, "vastError", o.vastError);
+        JsonKeyU64(out, a, "reason", o.reason);
+        a.Key("hops");
+        JsonBlock hops(out, a.Inner(), '[');
+        for (uint32_t h = 0; h < o.hopCount && o.hops != nullptr; ++h) {
+            const KaChainHop& hop = o.hops[h];
+            hops.Item();
+            fprintf(out, "{\"depth\": %" PRIu32 ", \"onPath\": %" PRIu32 ", \"url\": ", hop.depth,
+                    hop.onPath);
+            JsonString(out, hop.url);
+            fputs(", \"finalUrl\": ", out);
+            JsonString(out, hop.finalUrl);
+            fprintf(out,
+                    ", \"result\": %" PRIu32 ", \"bytes\": %" PRIu64 ", \"milliseconds\": %" PRIu32
+                    "}",
+                    hop.result, hop.bytes, hop.milliseconds);
+        }
+        hops.End();
+        a.Key("errorUrls");
+        JsonBlock urls(out, a.Inner(), '[');
+        for (uint32_t e = 0; e < o.errorUrlCount && o.errorUrls != nullptr; ++e) {
+            urls.Item();
+            JsonString(out, o.errorUrls[e]);
+        }
+        urls.End();
+        a.End();
+    });
+    list.End();
+}
+
 // Writes text to out with the control characters a terminal would act on shown as \xNN instead:
 // C0 controls but the line break, DEL, and C1 controls encoded in UTF-8.
 void WriteVisible(FILE* out, const char* text, size_t size) {
@@ -670,6 +732,7 @@ void PrintText(FILE* out, const ProcessResult& result) {
         return;
     }
     PrintTree(memory, result);
+    if (result.trace) PrintOutcomes(memory, result.outcomes);
     fclose(memory);
     WriteVisible(out, text, size);
     free(text);
@@ -689,6 +752,7 @@ void PrintJson(FILE* out, const ProcessResult& result) {
     }
     fputs(count != 0 ? "\n  ],\n  \"vastAdData\": " : "],\n  \"vastAdData\": ", out);
     JsonVast(out, result.vastAdData, 1, result, 0);
+    if (result.trace) JsonOutcomes(out, result.outcomes);
     fputs("\n}\n", out);
 }
 

@@ -6,6 +6,7 @@
 
 #include "ka/vast_records.h"
 #include "ka/vmap_parser_api.h"
+#include "ka/vmap_parser_ext.h"
 #include "ka/vmap_records.h"
 
 // Slot 5 of the table: the container of a nested VAST parser object.
@@ -18,6 +19,9 @@ struct ProcessResult {
     const VastAdData* vastAdData;  // the handle's VAST result, when it lent one
     NestedVastFn nestedVast;       // reads unmerged wrappers' nested parsers; null: not shown
     bool vastOnly;                 // the document was a bare VAST document
+    // The chain outcomes, printed after the records when trace is set (--trace).
+    const KaChainOutcome* outcomes;
+    bool trace;
 };
 
 // Nested parsers are shown down to this many levels below the document; the library stops

@@ -1,6 +1,7 @@
 #include "result_text.h"
 
 #include "ka/result_codes.h"
+#include "ka/vmap_parser_ext.h"
 
 const char* ResultText(uint32_t code) {
     switch (code) {
@@ -25,4 +26,30 @@ const char* ResultText(uint32_t code) {
         default:
             return "unknown result";
     }
+}
+
+const char* ChainStateText(uint32_t state) {
+    static const char* const kNames[] = {"not wrapped", "resolved", "wrapper", "emptied"};
+    return state < sizeof(kNames) / sizeof(kNames[0]) ? kNames[state] : "unknown";
+}
+
+const char* ChainReasonText(uint32_t reason) {
+    // Indexed by KA_CHAIN_REASON_*.
+    static const char* const kNames[] = {"none",
+                                         "a Wrapper without VASTAdTagURI",
+                                         "an Ad without InLine or Wrapper",
+                                         "the URL was refused",
+                                         "the download failed",
+                                         "the deadline passed",
+                                         "the stop flag was set",
+                                         "the document is not XML",
+                                         "an unsupported VAST version",
+                                         "a document without ads",
+                                         "the depth limit",
+                                         "the fetch budget",
+                                         "the byte budget",
+                                         "the merge share"};
+    static_assert(sizeof(kNames) / sizeof(kNames[0]) == KA_CHAIN_REASON_MERGE_SHARE + 1,
+                  "one name per reason");
+    return reason < sizeof(kNames) / sizeof(kNames[0]) ? kNames[reason] : "unknown";
 }
