@@ -199,7 +199,7 @@ typedef uint32_t (*KaExpandVASTMacrosFn)(const char* urlTemplate, const KaMacroV
 typedef struct VMAPParserExtAPI {
     uint32_t size; /* in: bytes the caller's table has; out: bytes the library filled */
     /* Lends the chain outcomes of the handle's last Process through *out (null when it read no
-     * ad); they live until the next Process or Close. */
+     * ad); they live until the next Process, Reset or Close. */
     uint32_t (*GetChainOutcomes)(void* handle, KaChainOutcome** out);
     /* kaExpandVASTMacros, for a player that looked up only the entry. */
     uint32_t (*ExpandMacros)(const char* urlTemplate, const KaMacroValues* values, char* out,
