@@ -18,7 +18,7 @@
 #include "ka/result_codes.h"
 #include "loopback.h"
 #include "net/download.h"
-#include "source_io_api.h"
+#include "source_io_module.h"
 
 namespace {
 
@@ -50,7 +50,7 @@ std::string Fetch(std::string url, uint32_t* code, KA_BOOL* stop = nullptr,
 // the stand-in reads only when enabled and inside its base.
 TEST(Download, FromTheLoopbackServer) {
     loopback::Server server;
-    SourceIOApi& api = loopback::SourceIo();
+    SourceIOApi& api = katest::SourceIo();
     ASSERT_TRUE(server.Running() && api.SetParam != nullptr);
     server.Put("doc", kDocument);
     server.Put("dir/doc", "in dir");
@@ -74,7 +74,7 @@ TEST(Download, FromTheLoopbackServer) {
     noInit.Init = nullptr;
     noUninit.Uninit = nullptr;
     noFinal.GetParam = [](void* handle, uint32_t id, void* value) {
-        return id == ka::kSioFinalUrl ? 5u : loopback::SourceIo().GetParam(handle, id, value);
+        return id == ka::kSioFinalUrl ? 5u : katest::SourceIo().GetParam(handle, id, value);
     };
     // URLs of 2047 characters (the longest that fits) and 2048, which cut would be the first.
     const std::string name(KA_DOWNLOAD_URL_SIZE - 1 - server.Url("/d/").size(), 'n');
