@@ -90,10 +90,6 @@ TEST(Download, FromTheLoopbackServer) {
         {"$DATA/", KA_TEST_DATA_DIR},
         {"$DOCUMENT", kDocument},
         {"$SPACES", std::string(KA_DOWNLOAD_MAX_SIZE, ' ')}};
-    const std::map<std::string, uint32_t> codes = {{"OK", KA_OK},
-                                                   {"LOAD_FAILED", KA_ERR_LOAD_FAILED},
-                                                   {"DOWNLOAD_FAILED", KA_ERR_DOWNLOAD_FAILED},
-                                                   {"DOWNLOAD_OPEN", KA_ERR_DOWNLOAD_OPEN}};
     const std::map<std::string, SourceIOApi*> modules = {
         {"-", &api},         {"null", nullptr},       {"over", &over},
         {"noInit", &noInit}, {"noUninit", &noUninit}, {"noFinal", &noFinal}};
@@ -128,7 +124,7 @@ TEST(Download, FromTheLoopbackServer) {
         const auto ms = std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - start);
         EXPECT_GE(ms.count() + 50, limit);  // at the module's time limit, not before
         EXPECT_LT(ms.count(), 5000 + limit);
-        EXPECT_EQ(codes.at(row[3]), code);
+        EXPECT_EQ(std::stoul(row[3], nullptr, 0), code);
         if (via != 'u' && code == 0) {
             text = std::string(reinterpret_cast<char*>(record->buffer), record->size);
         }

@@ -29,9 +29,7 @@ void Accept(const std::string& name) {
 }
 std::string Log() { return Fake<const char* (*)()>("fake_kadl_log")(); }
 
-void Prepare(CLibLoader& loader, const char* requested, const char* entry,
-             bool withWorkPath = true) {
-    if (withWorkPath) loader.SetWorkPath(gWorkPath.data());
+void Prepare(CLibLoader& loader, const char* requested, const char* entry) {
     snprintf(loader.mLibName, sizeof(loader.mLibName), "%s", requested);
     snprintf(loader.mEntryName, sizeof(loader.mEntryName), "%s", entry);
 }
@@ -65,7 +63,7 @@ TEST_F(LibLoaderTest, AsksForTheCandidatesInOrder) {
         if (found) Accept(last);
         CLibLoader loader;
         loader.SetWorkPath(path.empty() ? nullptr : &path[0]);
-        Prepare(loader, row[1].c_str(), kEntry, false);
+        Prepare(loader, row[1].c_str(), kEntry);
         loader.SetCpuVersion(std::stoi(row[2]));
         EXPECT_EQ(loader.LoadLib(nullptr), found ? 1 : 0);
         EXPECT_EQ(Log(), expected + (found ? "symbol:kaGetSourceIOAPI " : ""));
@@ -83,6 +81,7 @@ TEST_F(LibLoaderTest, HeldModuleIsFreedByTheNextLoadFreeLibAndTheDestructor) {
     {
         CLibLoader loader;
         EXPECT_EQ(CSDKObject::g_kaSDKObjectNum, live + 1);
+        loader.SetWorkPath(gWorkPath.data());
         Prepare(loader, "kaSourceIO", kEntry);
         EXPECT_EQ(loader.LoadLib(nullptr), 0);
         Accept(kEntry);
@@ -111,7 +110,7 @@ TEST_F(LibLoaderTest, IncompleteOrMissingServiceLoadsNothing) {
         const bool present = path != "/nonexistent/";
         CLibLoader loader;
         loader.SetWorkPath(path.data());
-        Prepare(loader, "kaSourceIO", "", false);
+        Prepare(loader, "kaSourceIO", "");
         EXPECT_EQ(loader.LoadLib(nullptr), 0);
         EXPECT_EQ(loader.LoadModuleService(), 0);
         EXPECT_EQ(loader.mServiceHandle != nullptr, present);
