@@ -35,17 +35,18 @@ TEST(Uri, Cases) {
         Buf out("garbage to be replaced"), s, a, p, q, h;
         uint32_t result = 0;
         Strings got;
+        auto arg = [&](size_t i) { return f[i + 1] == "<null>" ? nullptr : *in[i]; };
         if (f[0] == "split") {
-            result = GetComponentOfURI(*s, *a, *p, *q, *h, *in[0]);
+            result = GetComponentOfURI(*s, *a, *p, *q, *h, arg(0));
             got = {*s, *a, *p, *q, *h};
         } else {
-            if (f[0] == "combine") result = CombineURL(*out, *in[0], *in[1]);
-            if (f[0] == "resolve") result = ResolveURI(*out, *in[0], *in[1]);
-            if (f[0] == "dots") result = RemoveDotSegments(*in[0], *in[1]);
+            if (f[0] == "combine") result = CombineURL(*out, arg(0), arg(1));
+            if (f[0] == "resolve") result = ResolveURI(*out, arg(0), arg(1));
+            if (f[0] == "dots") result = RemoveDotSegments(arg(0), arg(1));
             if (f[0] == "dots") out = in[0];
-            if (f[0] == "merge") result = MergeURIPath(*out, *in[0], *in[1], *in[2]);
+            if (f[0] == "merge") result = MergeURIPath(*out, arg(0), arg(1), arg(2));
             if (f[0] == "generate")
-                result = GeneateURI(*in[0], *in[1], *in[2], *in[3], *in[4], *out);
+                result = GeneateURI(arg(0), arg(1), arg(2), arg(3), arg(4), *out);
             got = {*out};
         }
         EXPECT_EQ(0u, result);
@@ -55,31 +56,20 @@ TEST(Uri, Cases) {
     EXPECT_GT(rows.size(), 100u);
 }
 
-// Null arguments are skipped; a null or empty base or URI leaves things alone.
+// Null outputs are skipped; a null or empty URI leaves the components alone. (Null inputs are
+// rows of the case file.)
 TEST(Uri, NullAndEmptyArguments) {
-    Buf out("unchanged"), text("x"), ref("../c"), base("http://a/b?q#f"), empty;
-    EXPECT_EQ(0u, CombineURL(nullptr, *text, *text) + CombineURL(*out, nullptr, *text) +
-                      CombineURL(*out, *text, nullptr));
-    EXPECT_STREQ("unchanged", *out);
-    EXPECT_EQ(0u, ResolveURI(nullptr, *ref, *base) + RemoveDotSegments(nullptr, *text) +
-                      RemoveDotSegments(*out, nullptr) +
+    Buf text("x"), base("http://a/b?q#f"), empty, scheme("s"), query;
+    EXPECT_EQ(0u, CombineURL(nullptr, *text, *text) + ResolveURI(nullptr, *text, *base) +
+                      RemoveDotSegments(nullptr, *text) +
                       MergeURIPath(nullptr, *text, *text, *text) +
                       GeneateURI(*text, *text, *text, *text, *text, nullptr));
-    EXPECT_EQ(0u, ResolveURI(*out, *ref, nullptr));
-    EXPECT_STREQ("../c", *out);
-    // A null reference resolves to the base without its fragment.
-    EXPECT_EQ(0u, ResolveURI(*out, nullptr, *base));
-    EXPECT_STREQ("http://a/b?q", *out);
-
-    Buf scheme("s"), query, path("/p"), generated;
     EXPECT_EQ(0u, GetComponentOfURI(*scheme, nullptr, nullptr, *query, nullptr, *empty) +
                       GetComponentOfURI(*scheme, nullptr, nullptr, *query, nullptr, nullptr));
     EXPECT_STREQ("s", *scheme);
     EXPECT_STREQ("", *query);
     GetComponentOfURI(nullptr, nullptr, nullptr, *query, nullptr, *base);
     EXPECT_STREQ("q", *query);
-    GeneateURI(nullptr, nullptr, *path, nullptr, nullptr, *generated);
-    EXPECT_STREQ("/p", *generated);
 }
 
 }  // namespace
