@@ -5,11 +5,10 @@
 
 #include <cstdio>
 #include <cstdlib>
-#include <cstring>
 #include <fstream>
 #include <iterator>
 
-#include "ka/download.h"
+#include "source_io_module.h"
 
 namespace katest {
 
@@ -41,34 +40,15 @@ const VMAPParserExtAPI& ExtApi() {
     return api;
 }
 
-namespace {
-
-// The same file the library loads, hence the same instance; it stays loaded.
-SourceIOApi& SourceModule() {
-    static SourceIOApi table = {};
-    if (table.SetParam == nullptr) {
-        void* module = dlopen(KA_MODULES_DIR "libkaSourceIO.so", RTLD_NOW | RTLD_LOCAL);
-        auto entry = reinterpret_cast<KaGetSourceIOAPIFn>(
-            module != nullptr ? dlsym(module, "kaGetSourceIOAPI") : nullptr);
-        if (entry == nullptr || entry(&table) != 0 || table.SetParam == nullptr) abort();
-    }
-    return table;
-}
-
-constexpr uint32_t kAllowFiles = 0x7a000003;
-constexpr uint32_t kFileBaseDir = 0x7a000004;
-
-}  // namespace
-
 void AllowLocalFiles(bool allow) {
     uint32_t value = allow ? 1 : 0;
-    SourceModule().SetParam(nullptr, kAllowFiles, &value);
-    if (!allow) SourceModule().SetParam(nullptr, kFileBaseDir, const_cast<char*>(""));
+    SourceIo().SetParam(nullptr, ka::kSioAllowFiles, &value);
+    if (!allow) SourceIo().SetParam(nullptr, ka::kSioFileBaseDir, const_cast<char*>(""));
 }
 
 void AllowLocalFilesBelow(const std::string& folder) {
     AllowLocalFiles(true);
-    SourceModule().SetParam(nullptr, kFileBaseDir, const_cast<char*>(folder.c_str()));
+    SourceIo().SetParam(nullptr, ka::kSioFileBaseDir, const_cast<char*>(folder.c_str()));
 }
 
 std::vector<char> ReadFile(const std::string& path) {

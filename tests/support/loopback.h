@@ -1,10 +1,6 @@
-// An HTTP server on 127.0.0.1 run by the test process, and the source-IO stand-in as the host
-// holds it: the same loaded object the library reaches, so its module-wide settings apply to the
-// library's downloads.
+// An HTTP server on 127.0.0.1 run by the test process.
 #pragma once
 
-#include <dlfcn.h>
-#include <gtest/gtest.h>
 #include <httplib.h>
 
 #include <atomic>
@@ -12,8 +8,6 @@
 #include <mutex>
 #include <string>
 #include <thread>
-
-#include "source_io_api.h"
 
 namespace loopback {
 
@@ -77,17 +71,5 @@ private:
     std::map<std::string, std::string> docs_;
     std::map<std::string, int> counts_;
 };
-
-// The source-IO module's table, loaded once from the modules folder.
-inline SourceIOApi& SourceIo() {
-    static SourceIOApi api = [] {
-        SourceIOApi table = {};
-        void* module = dlopen(KA_MODULES_DIR "libkaSourceIO.so", RTLD_NOW);
-        void* entry = module != nullptr ? dlsym(module, "kaGetSourceIOAPI") : nullptr;
-        if (entry != nullptr) reinterpret_cast<KaGetSourceIOAPIFn>(entry)(&table);
-        return table;
-    }();
-    return api;
-}
 
 }  // namespace loopback

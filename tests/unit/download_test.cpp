@@ -8,6 +8,7 @@
 #include <cstdio>
 #include <filesystem>
 #include <fstream>
+#include <map>
 #include <sstream>
 #include <string>
 #include <thread>
@@ -17,7 +18,7 @@
 #include "ka/result_codes.h"
 #include "loopback.h"
 #include "net/download.h"
-#include "source_io_api.h"
+#include "source_io_module.h"
 
 namespace {
 
@@ -49,7 +50,7 @@ std::string Fetch(std::string url, uint32_t* code, KA_BOOL* stop = nullptr,
 // the stand-in reads only when enabled and inside its base.
 TEST(Download, FromTheLoopbackServer) {
     loopback::Server server;
-    SourceIOApi& api = loopback::SourceIo();
+    SourceIOApi& api = katest::SourceIo();
     ASSERT_TRUE(server.Running() && api.SetParam != nullptr);
     server.Put("doc", kDocument);
     server.Put("dir/doc", "in dir");
@@ -73,104 +74,76 @@ TEST(Download, FromTheLoopbackServer) {
     noInit.Init = nullptr;
     noUninit.Uninit = nullptr;
     noFinal.GetParam = [](void* handle, uint32_t id, void* value) {
-        return id == ka::kSioFinalUrl ? 5u : loopback::SourceIo().GetParam(handle, id, value);
+        return id == ka::kSioFinalUrl ? 5u : katest::SourceIo().GetParam(handle, id, value);
     };
-    const std::string doc = server.Url("/d/doc"), stall = server.Url("/stall"),
-                      redirect = server.Url("/redirect?to=/d/doc"),
-                      max = server.Url("/size/" + std::to_string(KA_DOWNLOAD_MAX_SIZE)),
-                      big = server.Url("/size/" + std::to_string(ka::kSioMaxBodySize + 1));
     // URLs of 2047 characters (the longest that fits) and 2048, which cut would be the first.
     const std::string name(KA_DOWNLOAD_URL_SIZE - 1 - server.Url("/d/").size(), 'n');
-    const std::string fits = server.Put(name, "fits"), overLong = server.Put(name + "n", "over");
-    const struct {
-        // u: ka_download_by_url; b: DownloadToBuffer; a: DownloadWithAllocator; n: the same
-        // without an allocator.
-        char via;
-        std::string url;
-        KA_BOOL stop;
-        uint32_t code;
-        std::string text = "<none>", finalUrl = "";  // <none>: no buffer
-        uint32_t redirects = 0;
-        KA_BOOL useBase = 0;
-        SourceIOApi* api = &loopback::SourceIo();
-        uint32_t totalTimeoutMs = 0;  // the module's time limit; 0: its default
-        const char* workPath = KA_MODULES_DIR;
-    } cases[] = {
-        // ka_download_by_url gives a buffer once it reaches the read stage.
-        {'u', doc, 0, 0, kDocument},
-        {'u', server.Url("/size/0"), 0, 0, ""},
-        {'u', server.Url("/d/missing"), 0, KA_ERR_DOWNLOAD_FAILED},
-        {'u', loopback::Server().Url("/d/x"), 0, KA_ERR_DOWNLOAD_FAILED},  // refused
-        {'u', big, 0, KA_ERR_DOWNLOAD_FAILED},
-        {'u', stall, 0, KA_ERR_DOWNLOAD_FAILED, "<none>", "", 0, 0, nullptr, 300},
-        {'u', doc, 0, KA_ERR_LOAD_FAILED, "<none>", "", 0, 0, nullptr, 0, KA_TEST_DATA_DIR "net/"},
-        {'u', fits, 0, 0, "fits"},
-        {'u', overLong, 0, KA_ERR_DOWNLOAD_FAILED},
-        // Stopped with no size known: a zero-length buffer. 2 stops as 1 does but reads as success.
-        {'u', stall, 1, KA_ERR_DOWNLOAD_FAILED, ""},
-        {'u', stall, 2, 0, ""},
-        {'b', redirect, 0, 0, kDocument, doc, 1},
-        {'b', server.Url("/agent"), 0, 0, agent, server.Url("/agent")},  // the host's text
-        {'b', "doc", 0, 0, "in dir", server.Url("/d/dir/doc"), 0, 1},
-        {'b', "doc", 0, KA_ERR_DOWNLOAD_FAILED},  // used as given without the base
-        {'b', max, 0, 0, std::string(KA_DOWNLOAD_MAX_SIZE, ' '), max},
-        // Stop flag 1 ends in the read as stopped; 2 reads nothing and fails after it.
-        {'b', stall, 1, KA_ERR_DOWNLOAD_FAILED},
-        {'b', stall, 2, KA_ERR_LOAD_FAILED},
-        {'b', doc, 0, KA_ERR_LOAD_FAILED, "<none>", "", 0, 0, &over},
-        {'b', doc, 0, KA_ERR_DOWNLOAD_OPEN, "<none>", "", 0, 0, nullptr},
-        {'b', doc, 0, KA_ERR_DOWNLOAD_OPEN, "<none>", "", 0, 0, &noInit},
-        {'b', doc, 0, KA_ERR_DOWNLOAD_OPEN, "<none>", "", 0, 0, &noUninit},  // could not close
-        {'b', redirect, 0, 0, kDocument, redirect, 1, 0, &noFinal},          // the URL as asked
-        {'a', doc, 0, 0, kDocument, doc},
-        {'n', doc, 0, KA_ERR_LOAD_FAILED},
-    };
-    for (const auto& c : cases) {
-        SCOPED_TRACE(std::string(1, c.via) + " " + c.url.substr(0, 80) + " stop " +
-                     std::to_string(c.stop));
-        uint32_t limit = c.totalTimeoutMs;
+    // Text and binary values last, so that no name is looked for inside them.
+    const std::vector<std::pair<std::string, std::string>> names = {
+        {"$SERVER", server.Url("")},
+        {"$REFUSED", loopback::Server().Url("")},
+        {"$FITS", server.Put(name, "fits")},
+        {"$OVERLONG", server.Put(name + "n", "over")},
+        {"$MAX", std::to_string(KA_DOWNLOAD_MAX_SIZE)},
+        {"$BIG", std::to_string(ka::kSioMaxBodySize + 1)},
+        {"$MODULES", KA_MODULES_DIR},
+        {"$DATA/", KA_TEST_DATA_DIR},
+        {"$DOCUMENT", kDocument},
+        {"$SPACES", std::string(KA_DOWNLOAD_MAX_SIZE, ' ')}};
+    const std::map<std::string, SourceIOApi*> modules = {
+        {"-", &api},         {"null", nullptr},       {"over", &over},
+        {"noInit", &noInit}, {"noUninit", &noUninit}, {"noFinal", &noFinal}};
+    const auto rows = katest::ReadCases(KA_TEST_DATA_DIR "net/download_cases.txt");
+    for (auto row : rows) {
+        SCOPED_TRACE(row[0] + " " + row[1] + " stop " + row[2]);
+        for (std::string& field : row) field = katest::Expand(field, names);
+        const char via = row[0][0];
+        uint32_t limit = static_cast<uint32_t>(std::stoul(row[9]));
+        const KA_BOOL useBase = static_cast<KA_BOOL>(std::stoi(row[7]));
         ASSERT_EQ(0u, api.SetParam(nullptr, ka::kSioTotalTimeoutMs, &limit));
-        snprintf(record->url, sizeof(record->url), "%s", c.url.c_str());
-        record->allocator = c.via == 'a' ? &allocator : nullptr;
-        if (c.via != 'b') record->buffer = nullptr;
+        snprintf(record->url, sizeof(record->url), "%s", row[1].c_str());
+        record->allocator = via == 'a' ? &allocator : nullptr;
+        if (via != 'b') record->buffer = nullptr;
         const uint8_t *const before = buffer, *const recordBefore = record->buffer;
         const uint32_t roomBefore = capacity;
-        KA_BOOL stop = c.stop;
+        KA_BOOL stop = static_cast<KA_BOOL>(std::stoi(row[2]));
         uint32_t code = 0;
         std::string text = "<none>";
         info = {};
         const auto start = Clock::now();
-        if (c.via == 'u') text = Fetch(c.url, &code, &stop, c.workPath);
-        if (c.via == 'b') {
-            code = DownloadToBuffer(c.api, &request, &request, &request, &request, record, &buffer,
-                                    &capacity, &count, &stop, c.useBase, &info, agent);
+        if (via == 'u') text = Fetch(row[1], &code, &stop, row[10]);
+        if (via == 'b') {
+            code =
+                DownloadToBuffer(modules.at(row[8]), &request, &request, &request, &request, record,
+                                 &buffer, &capacity, &count, &stop, useBase, &info, agent);
         }
-        if (c.via == 'a' || c.via == 'n') {
-            code = DownloadWithAllocator(c.api, nullptr, nullptr, nullptr, nullptr, record, &stop,
-                                         c.useBase, nullptr, nullptr);  // nothing optional
+        if (via == 'a' || via == 'n') {
+            code = DownloadWithAllocator(modules.at(row[8]), nullptr, nullptr, nullptr, nullptr,
+                                         record, &stop, useBase, nullptr, nullptr);  // no options
         }
         const auto ms = std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - start);
-        EXPECT_GE(ms.count() + 50, c.totalTimeoutMs);  // at the module's time limit, not before
-        EXPECT_LT(ms.count(), 5000 + c.totalTimeoutMs);
-        EXPECT_EQ(c.code, code);
-        if (c.via != 'u' && code == 0) {
+        EXPECT_GE(ms.count() + 50, limit);  // at the module's time limit, not before
+        EXPECT_LT(ms.count(), 5000 + limit);
+        EXPECT_EQ(std::stoul(row[3], nullptr, 0), code);
+        if (via != 'u' && code == 0) {
             text = std::string(reinterpret_cast<char*>(record->buffer), record->size);
         }
-        EXPECT_EQ(c.text, text);
-        if (c.via == 'u') continue;
+        EXPECT_EQ(row[4], text);
+        if (via == 'u') continue;
         // A failure takes no buffer and gives none.
         EXPECT_TRUE(code == 0 || (roomBefore == capacity && recordBefore == record->buffer));
         if (code != 0) continue;
-        EXPECT_EQ(c.finalUrl, record->finalURL);
-        EXPECT_EQ(c.redirects, info.redirects);
+        EXPECT_EQ(row[5], record->finalURL);
+        EXPECT_EQ(std::stoul(row[6]), info.redirects);
         EXPECT_EQ(3 * record->size, record->capacity);
-        EXPECT_TRUE(c.via != 'a' || asked == record->capacity);
-        if (c.via != 'b') continue;
+        EXPECT_TRUE(via != 'a' || asked == record->capacity);
+        if (via != 'b') continue;
         EXPECT_TRUE(3 * count > roomBefore || before == buffer);  // a smaller document reuses it
         EXPECT_EQ(std::max<size_t>(roomBefore, 3 * count), capacity);
         EXPECT_EQ(buffer, record->buffer);
         EXPECT_EQ(count, record->size);
     }
+    EXPECT_EQ(rows.size(), 25u);
     char* const url = record->url;
     EXPECT_EQ(KA_ERR_NULL_ARGUMENT, ka_download_by_url(nullptr, &buffer, &count, nullptr, nullptr));
     EXPECT_EQ(KA_ERR_NULL_ARGUMENT, ka_download_by_url(url, nullptr, &count, nullptr, nullptr));
@@ -208,47 +181,21 @@ TEST(Download, FromTheLoopbackServer) {
     std::ifstream stream(kLocal, std::ios::binary);
     const std::string local((std::istreambuf_iterator<char>(stream)), {});
     ASSERT_FALSE(local.empty());
-    // {URL, read when files are allowed}
-    const struct {
-        std::string url;
-        bool readable;
-    } files[] = {{"file://" + in, true},
-                 {"file://localhost" + in, true},
-                 {in, true},
-                 {"local_document.xml", true},
-                 {"alias.xml", true},  // a symlink that stays in
-                 // Outside the base: absolute, as a file URL, climbing out, through a symlink, in
-                 // a sibling whose name starts with the base's.
-                 {tmp + "/outside.xml", false},
-                 {"file://" + tmp + "/outside.xml", false},
-                 {"file://" + base + "/../outside.xml", false},
-                 {"escape.xml", false},
-                 {tmp + "/base2/local_document.xml", false},
-                 {kLocal, false},
-                 // Relative references never climb; only regular files; no redirect to a file.
-                 {"../base/local_document.xml", false},
-                 {"x/../../base/local_document.xml", false},
-                 {"net/x.xml", false},
-                 {"missing.xml", false},
-                 {"file://relative.xml", false},
-                 {"/dev/zero", false},
-                 {base, false},
-                 {server.Url("/redirect?to=file://" + in), false},
-                 {"data:,abc", false},
-                 {"", false},
-                 {"ftp://127.0.0.1:1/x", false},
-                 {"gopher://127.0.0.1:1/", false},
-                 {"dict://127.0.0.1:1/x", false}};
+    const std::vector<std::pair<std::string, std::string>> paths = {
+        {"$BASE", base}, {"$TMP", tmp}, {"$LOCAL", kLocal}, {"$SERVER", server.Url("")}};
+    const auto files = katest::ReadCases(KA_TEST_DATA_DIR "net/file_cases.txt");
+    EXPECT_EQ(files.size(), 24u);
     for (bool allowed : {true, false}) {  // ends with the defaults
         uint32_t on = allowed;
         ASSERT_EQ(0u, api.SetParam(nullptr, ka::kSioAllowFiles, &on));
         api.SetParam(nullptr, ka::kSioFileBaseDir,
                      allowed ? const_cast<char*>(base.c_str()) : nullptr);
         for (const auto& f : files) {
-            const bool readable = allowed && f.readable;
+            const bool readable = allowed && f[1] == "yes";
+            const std::string url = katest::Expand(f[0], paths);
             uint32_t code = 0;
-            EXPECT_EQ(readable ? local : "<none>", Fetch(f.url, &code)) << f.url << " " << allowed;
-            EXPECT_EQ(readable ? 0u : KA_ERR_DOWNLOAD_FAILED, code) << f.url << " " << allowed;
+            EXPECT_EQ(readable ? local : "<none>", Fetch(url, &code)) << url << " " << allowed;
+            EXPECT_EQ(readable ? 0u : KA_ERR_DOWNLOAD_FAILED, code) << url << " " << allowed;
         }
     }
     fs::remove_all(tmp);

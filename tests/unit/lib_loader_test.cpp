@@ -9,6 +9,7 @@
 #include <string>
 #include <vector>
 
+#include "case_file.h"
 #include "ka/module_loading.h"
 
 namespace {
@@ -28,9 +29,7 @@ void Accept(const std::string& name) {
 }
 std::string Log() { return Fake<const char* (*)()>("fake_kadl_log")(); }
 
-void Prepare(CLibLoader& loader, const char* requested, const char* entry,
-             bool withWorkPath = true) {
-    if (withWorkPath) loader.SetWorkPath(gWorkPath.data());
+void Prepare(CLibLoader& loader, const char* requested, const char* entry) {
     snprintf(loader.mLibName, sizeof(loader.mLibName), "%s", requested);
     snprintf(loader.mEntryName, sizeof(loader.mEntryName), "%s", entry);
 }
@@ -43,39 +42,35 @@ protected:
     }
 };
 
+// One search a line of tests/data/loader_cases.txt: the names asked for in order, what loads and
+// the name the loader is left holding, never cut short.
 TEST_F(LibLoaderTest, AsksForTheCandidatesInOrder) {
-    const std::vector<std::string> all = {"kaSourceIO", "libkaSourceIO", "/system/lib/kaSourceIO",
-                                          "/system/lib/libkaSourceIO"};
-    // {with the working path, requested, CPU version (7: codec variants first), the names asked for
-    // after the working path, whether the last of them loads}
-    // clang-format off
-    const struct { bool withWorkPath; const char* requested; int cpuVersion; std::vector<std::string> asks; bool found; } cases[] = {
-        {false, "kaSourceIO", 0, all, true}, {false, "kaSourceIO", 0, {"kaSourceIO"}, true},
-        {false, "kaSourceIO", 0, all, false}, {false, "/opt/ka.so", 0, {"/opt/ka.so"}, false},
-        {true, "kaSourceIO", 0, {"libkaSourceIO.so"}, true},
-        {true, "kaXMLParser.so", 0, {"libkaXMLParser.so"}, false},
-        {true, "kaMylibMod", 0, {"kaMylibMod.so"}, true},
-        {true, "kaVidDec", 7, {"libkaVidDec_v7.so", "libkaVidDec.so"}, true},
-        {true, "kaAACDec", 7, {"libkaAACDec_v7.so"}, true},
-        {true, "kaSourceIO", 7, {"libkaSourceIO.so", "libkaSourceIO.so"}, false},
-        {true, "kaVidDec", 6, {"libkaVidDec.so"}, false}};
-    // clang-format on
-    for (const auto& c : cases) {
+    const auto rows = katest::ReadCases(KA_TEST_DATA_DIR "loader_cases.txt");
+    for (const auto& row : rows) {
+        SCOPED_TRACE(testing::PrintToString(row));
         SetUp();
         Accept(kEntry);
-        std::string expected, last;
-        for (const std::string& name : c.asks) {
-            last = (c.withWorkPath ? gWorkPath : "") + name;
+        std::string path = row[0] == "-" ? "" : kFakeDir, expected, last;
+        if (isdigit(row[0][0])) {
+            ASSERT_LT(kFakeDir.size(), std::stoul(row[0]));
+            path.resize(std::stoul(row[0]), '/');
+        }
+        for (size_t i = 4; i < row.size(); ++i) {
+            last = path + row[i];
             expected += "load:" + last + " ";
         }
-        if (c.found) Accept(last);
+        const bool found = row[3] == "yes";
+        if (found) Accept(last);
         CLibLoader loader;
-        Prepare(loader, c.requested, kEntry, c.withWorkPath);
-        loader.SetCpuVersion(c.cpuVersion);
-        EXPECT_EQ(loader.LoadLib(nullptr), c.found ? 1 : 0) << last;
-        EXPECT_EQ(Log(), expected + (c.found ? "symbol:kaGetSourceIOAPI " : ""));
-        EXPECT_EQ(loader.mLibName, last);
+        loader.SetWorkPath(path.empty() ? nullptr : &path[0]);
+        Prepare(loader, row[1].c_str(), kEntry);
+        loader.SetCpuVersion(std::stoi(row[2]));
+        EXPECT_EQ(loader.LoadLib(nullptr), found ? 1 : 0);
+        EXPECT_EQ(Log(), expected + (found ? "symbol:kaGetSourceIOAPI " : ""));
+        EXPECT_TRUE(last.empty() || last == loader.mLibName) << loader.mLibName;
+        EXPECT_LT(strnlen(loader.mLibName, sizeof(loader.mLibName)), sizeof(loader.mLibName));
     }
+    EXPECT_EQ(rows.size(), 15u);
 }
 
 // A module without its entry is still held. Without an entry name nothing is resolved and the
@@ -86,6 +81,7 @@ TEST_F(LibLoaderTest, HeldModuleIsFreedByTheNextLoadFreeLibAndTheDestructor) {
     {
         CLibLoader loader;
         EXPECT_EQ(CSDKObject::g_kaSDKObjectNum, live + 1);
+        loader.SetWorkPath(gWorkPath.data());
         Prepare(loader, "kaSourceIO", kEntry);
         EXPECT_EQ(loader.LoadLib(nullptr), 0);
         Accept(kEntry);
@@ -114,7 +110,7 @@ TEST_F(LibLoaderTest, IncompleteOrMissingServiceLoadsNothing) {
         const bool present = path != "/nonexistent/";
         CLibLoader loader;
         loader.SetWorkPath(path.data());
-        Prepare(loader, "kaSourceIO", "", false);
+        Prepare(loader, "kaSourceIO", "");
         EXPECT_EQ(loader.LoadLib(nullptr), 0);
         EXPECT_EQ(loader.LoadModuleService(), 0);
         EXPECT_EQ(loader.mServiceHandle != nullptr, present);
@@ -122,37 +118,6 @@ TEST_F(LibLoaderTest, IncompleteOrMissingServiceLoadsNothing) {
         EXPECT_EQ(loader.FreeModuleService(), 0);
         EXPECT_EQ(loader.mServiceHandle, nullptr);
         EXPECT_EQ(loader.mLoadLibrary, nullptr);
-    }
-}
-
-// A name that does not fit mLibName is never asked for cut short: the search ends there. The
-// working paths are the fake's folder padded with slashes to a length.
-TEST_F(LibLoaderTest, NamesThatDoNotFitAreNeverAsked) {
-    const std::string n250(250, 'n');
-    // {working path length (0: none), requested, CPU version, the names asked for after the path}
-    // clang-format off
-    const struct { size_t length; std::string requested; int cpuVersion; std::vector<std::string> asks; } cases[] = {
-        {243, "kaSourceIO", 0, {}},  // libkadl.so fits, libkaSourceIO.so does not
-        {240, "kaVidDec", 7, {"libkaVidDec.so"}},  // the plain name fits, its "_v7.so" variant not
-        {0, n250, 0, {n250, "lib" + n250}},  // "/system/lib/" candidates do not fit
-        {400, "kaSourceIO", 0, {}},  // not even libkadl.so fits
-    };
-    // clang-format on
-    for (const auto& c : cases) {
-        SCOPED_TRACE(std::to_string(c.length) + " " + c.requested);
-        SetUp();
-        ASSERT_LT(kFakeDir.size(), c.length == 0 ? 256 : c.length);
-        std::string path =
-            c.length == 0 ? "" : kFakeDir + std::string(c.length - kFakeDir.size(), '/');
-        std::string expected;
-        for (const std::string& name : c.asks) expected += "load:" + path + name + " ";
-        CLibLoader loader;
-        loader.SetWorkPath(c.length == 0 ? nullptr : &path[0]);
-        Prepare(loader, c.requested.c_str(), kEntry, false);
-        loader.SetCpuVersion(c.cpuVersion);
-        EXPECT_EQ(loader.LoadLib(nullptr), 0);
-        EXPECT_EQ(Log(), expected);
-        EXPECT_LT(strnlen(loader.mLibName, sizeof(loader.mLibName)), sizeof(loader.mLibName));
     }
 }
 

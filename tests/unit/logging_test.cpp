@@ -71,9 +71,16 @@ TEST_P(Family, LevelsCutsAndEntry) {
 
 INSTANTIATE_TEST_SUITE_P(Logging, Family, testing::ValuesIn(kPrinters));
 
-// Each load replaces the last, and an incomplete library is still used. After a failed load
-// nothing is, though the entries of the last library are still remembered.
+// Error texts come from the library, in one static buffer, always terminated. Each load replaces
+// the last, and an incomplete library is still used. After a failed load nothing is, and error
+// texts are empty, though the entries of the last library are still remembered.
 TEST(Logging, EachLoadReplacesTheLast) {
+    ASSERT_EQ(Load(kRecording), KA_OK);
+    const char* text = kalogGetErrMsg0x010d0000(KA_ERR_LOAD_FAILED);
+    EXPECT_STREQ(text, "fake error 0x91001000");
+    Reset(ka::CurrentLogLibrary().handle, 1);
+    EXPECT_EQ(kalogGetErrMsg0x010d0000(1), text);
+    EXPECT_EQ(std::string(text), std::string(2047, 'x'));
     const std::pair<std::string, uint32_t> loads[] = {
         {kRecording, KA_OK},
         {kFakes + "logsys_without_setparam", KA_OK},
@@ -86,20 +93,9 @@ TEST(Logging, EachLoadReplacesTheLast) {
         kalogPrint0x010d0000(0, "x");
     }
     EXPECT_EQ(Load(kFakes + "no_such_folder"), KA_ERR_MODULE_NOT_LOADED);
+    EXPECT_STREQ(kalogGetErrMsg0x010d0000(1), "");
     kalogPrint0x010d0000(0, "y");
     for (void* library : libraries) EXPECT_EQ(Log(library), "kaLogDllLogPrint 0 x\n|");
-}
-
-// One static buffer, always terminated, and empty once no library is loaded.
-TEST(Logging, ErrorMessageFromTheLibrary) {
-    ASSERT_EQ(Load(kRecording), KA_OK);
-    const char* text = kalogGetErrMsg0x010d0000(KA_ERR_LOAD_FAILED);
-    EXPECT_STREQ(text, "fake error 0x91001000");
-    Reset(ka::CurrentLogLibrary().handle, 1);
-    EXPECT_EQ(kalogGetErrMsg0x010d0000(1), text);
-    EXPECT_EQ(std::string(text), std::string(2047, 'x'));
-    EXPECT_EQ(Load(kFakes + "no_such_folder"), KA_ERR_MODULE_NOT_LOADED);
-    EXPECT_STREQ(kalogGetErrMsg0x010d0000(1), "");
 }
 
 TEST(LibraryPath, OneSlashBetweenDirectoryAndFile) {

@@ -30,7 +30,9 @@ TEST(TextHelpers, Cases) {
             EXPECT_EQ(0, unescape_amp(&f[1][0]));
             EXPECT_EQ(f[2], f[1].c_str());
         } else {
-            EXPECT_EQ(std::stoul(f[2]), string2time(f[1].c_str(), int(f[1].size()) + 1));
+            EXPECT_EQ(
+                std::stoul(f[2]),
+                string2time(f[1].c_str(), f.size() > 3 ? std::stoi(f[3]) : int(f[1].size()) + 1));
         }
     }
     EXPECT_GT(rows.size(), 40u);
@@ -45,10 +47,7 @@ TEST(TextHelpers, NullAndEdgeArguments) {
     }
     EXPECT_EQ(std::string(8, 'Z'), std::string(dst, 8));
     EXPECT_EQ(0, unescape_amp(nullptr));
-    // The length only guards against nothing.
-    EXPECT_EQ(0u,
-              string2time(nullptr, 8) + string2time("00:00:30", 0) + string2time("00:00:30", -1));
-    EXPECT_EQ(30000u, string2time("00:00:30", 1));
+    EXPECT_EQ(0u, string2time(nullptr, 8));
     // Decoding that moved the whole tail at every occurrence would not finish here.
     std::string many;
     for (int i = 0; i < 200000; ++i) many += "&amp;";

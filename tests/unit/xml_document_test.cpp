@@ -1,6 +1,6 @@
 // CXMLDocument over the real XML parser module, loaded from the modules folder through
-// libkadl.so: what it answers without a module, and one handle reading another's nodes. What
-// element texts read into is shown by the document cases (documents/vmap/element_texts.xml).
+// libkadl.so: what it answers without a module, and CDATA sections read through another handle.
+// What element texts read into is shown by the document cases (documents/vmap/element_texts.xml).
 #include "xml/xml_document.h"
 
 #include <gtest/gtest.h>
@@ -56,39 +56,24 @@ TEST(XmlDocument, WithoutModuleOperationsAnswerNotLoaded) {
     }
 }
 
-// The VAST parser reads nodes of the VMAP parser's document through its own handle; what the
-// owner lent stays valid while the other handle loads a document of its own.
-TEST(XmlDocument, ReadsNodesThroughAnotherHandle) {
+// IsElementCData: 0 only for a CDATA section, whose raw text it gives; length 0 and no text for
+// an element without one. The nodes are read through a second handle, as the VAST parser reads
+// those of the VMAP parser's document (which the document cases show at length).
+TEST(XmlDocument, CDataThroughAnotherHandle) {
     CXMLDocument owner, d;
     for (CXMLDocument* document : {&owner, &d}) {
         document->SetWorkPath(gModulesDir);
         ASSERT_EQ(document->InitXMLParser(), KA_OK);
     }
-    ASSERT_NE(owner.mXMLHandle, d.mXMLHandle);
-    ASSERT_EQ(Load(owner, "<r a=\"v\">t<b/><c><![CDATA[ z ]]></c></r>"), KA_OK);
-    void *root = kSentinel, *b = kSentinel, *c = kSentinel, *byName = kSentinel;
-    d.GetFirstChild(nullptr, &root);
-    EXPECT_EQ(root, nullptr);  // d has loaded nothing
+    ASSERT_EQ(Load(owner, "<r>t<b/><c><![CDATA[ z ]]></c></r>"), KA_OK);
+    void *root = nullptr, *b = nullptr, *c = nullptr;
     owner.GetFirstChild(nullptr, &root);
-    ASSERT_NE(root, nullptr);
     d.GetFirstChild(root, &b);
     d.GetNextSibling(b, &c);
-    char cName[] = "c", aName[] = "a";
-    d.GetChildByName(root, cName, &byName);
     ASSERT_NE(c, nullptr);
-    EXPECT_EQ(byName, c);
-    char *name = nullptr, *value = nullptr, *lent = nullptr;
-    int length = 0;
-    d.GetTagName(c, &name, length);
-    d.GetAttributeValue(root, aName, &value, length);
-    owner.GetTagValue(c, &lent, length);
-    ASSERT_TRUE(name != nullptr && value != nullptr && lent != nullptr);
-
-    // IsElementCData: 0 only for a CDATA section, whose raw text it gives; length 0 and no text
-    // for an element without one.
     auto cdata = [&](void* node) {
         char* text = gUntouched;
-        length = 77;
+        int length = 77;
         const unsigned int result = d.IsElementCData(node, &text, length);
         return std::to_string(result) + " " + (text ? text : "<null>") + " " +
                std::to_string(length);
@@ -97,11 +82,6 @@ TEST(XmlDocument, ReadsNodesThroughAnotherHandle) {
     EXPECT_EQ(cdata(c), "0 ![CDATA[ z ]] 13");
     EXPECT_EQ(cdata(root), failed + " t 1");
     EXPECT_EQ(cdata(b), failed + " <null> 0");
-
-    ASSERT_EQ(Load(d, "<other/>"), KA_OK);
-    EXPECT_STREQ(name, "c");
-    EXPECT_STREQ(value, "v");
-    EXPECT_STREQ(lent, "![CDATA[ z ]]");
 }
 
 }  // namespace
