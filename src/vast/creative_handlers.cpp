@@ -12,7 +12,7 @@ unsigned int CVASTParser::LoadCreative(void* node, void* target, char* name,
     // The error keeps other children out of the InLine's creativeCount.
     if (node == nullptr || target == nullptr || name == nullptr) return KA_ERR_LOAD_FAILED;
     if (!NameIs(name, nameLength, "Creative")) return KA_ERR_LOAD_FAILED;
-    AdCreative* creative = new AdCreative();
+    AdCreative* creative = mArena->New<AdCreative>();
     mCreativeTail.Append(static_cast<AdCreative**>(target), creative);
     LoadCreativeAttributes(node, creative);
     LoadTag(node, creative, &CVASTParser::LoadCreativeTag);
@@ -21,13 +21,12 @@ unsigned int CVASTParser::LoadCreative(void* node, void* target, char* name,
 
 unsigned int CVASTParser::LoadCreativeAttributes(void* node, AdCreative* creative) {
     if (node == nullptr || creative == nullptr) return KA_OK;
-    CopyAttribute(node, "id", creative->id);
-    char* value = nullptr;
-    int length = 0;
-    if (ReadAttribute(node, "sequence", &value, length)) {
-        creative->sequence = atoi(value);
-    }
-    CopyAttribute(node, "adId", creative->adId);
+    static const XMLAttributeName kNames[] = {"id", "sequence", "adId"};
+    XMLAttributeValue values[3];
+    ReadAttributes(node, kNames, values);
+    CopyAttribute(values[0], creative->id);
+    if (values[1].Present()) creative->sequence = atoi(values[1].value);
+    CopyAttribute(values[2], creative->adId);
     return KA_OK;
 }
 

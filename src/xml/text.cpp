@@ -72,15 +72,23 @@ int ParseDecimal(const char* text) {
     return static_cast<int>(value);
 }
 
-char* CopyText(const char* text, size_t length) {
-    char* copy = new char[length + 1];
-    memcpy(copy, text, length);
-    copy[length] = '\0';
-    return copy;
-}
-
-char* CopyString(const char* text) {
-    return text == nullptr ? nullptr : CopyText(text, strlen(text));
+size_t CopyDecodingAmp(char* out, const char* text, size_t length) {
+    char* write = out;
+    const char* read = text;
+    const char* end = text + length;
+    // Between two '&' everything moves as one block; most texts hold none.
+    while (const char* amp = static_cast<const char*>(memchr(read, '&', end - read))) {
+        memcpy(write, read, amp - read);
+        write += amp - read;
+        *write++ = '&';
+        const bool entity = static_cast<size_t>(end - amp) >= kAmpEntityLength &&
+                            memcmp(amp, kAmpEntity, kAmpEntityLength) == 0;
+        read = amp + (entity ? kAmpEntityLength : 1);
+    }
+    memcpy(write, read, end - read);
+    write += end - read;
+    *write = '\0';
+    return static_cast<size_t>(write - out);
 }
 
 }  // namespace ka

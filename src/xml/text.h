@@ -45,13 +45,10 @@ bool ScanDecimal(const char** cursor, int width, long long* value);
 // without digits), clamped to the int range instead of overflowing.
 int ParseDecimal(const char* text);
 
-// A new[] copy of the first length characters of text, terminated. Like every allocation of
-// the parsers, throws std::bad_alloc when memory runs out; the public table turns that into
-// KA_ERR_NO_MEMORY.
-char* CopyText(const char* text, size_t length);
-// A new[] copy of a terminated string; null for null.
-char* CopyString(const char* text);
-// The bytes CopyString allocates for text; 0 for null.
+// Copies the first length characters of text into out (room for length + 1), turning every
+// "&amp;" into "&" as unescape_amp does, and terminates it; the length written.
+size_t CopyDecodingAmp(char* out, const char* text, size_t length);
+// The bytes a copy of text takes (ka::Arena::CopyString); 0 for null.
 inline size_t CopySize(const char* text) { return text == nullptr ? 0 : strlen(text) + 1; }
 
 }  // namespace ka
