@@ -1,5 +1,4 @@
 // Handlers of the document, <Ad>, <InLine> and <Wrapper> levels.
-#include <cstdlib>
 
 #include "ka/result_codes.h"
 #include "ka/vast_extension.h"
@@ -26,11 +25,11 @@ unsigned int CVASTParser::LoadVASTTag(void* node, void* target, char* name,
 
 unsigned int CVASTParser::LoadAdAttributes(void* node, AdData* ad) {
     if (node == nullptr || ad == nullptr) return KA_OK;
-    static const XMLAttributeName kNames[] = {"id", "sequence"};
+    static constexpr auto kNames = ka::AttributeNames("id", "sequence");
     XMLAttributeValue values[2];
     ReadAttributes(node, kNames, values);
     CopyAttribute(values[0], ad->id);
-    if (values[1].Present()) ad->sequence = atoi(values[1].value);
+    if (values[1].Present()) ad->sequence = ka::Atoi(values[1].value);
     return KA_OK;
 }
 

@@ -1,5 +1,4 @@
 // Handlers of <Creatives> and <Creative>: one AdCreative per Creative element.
-#include <cstdlib>
 
 #include "ka/result_codes.h"
 #include "vast/vast_parser.h"
@@ -21,11 +20,11 @@ unsigned int CVASTParser::LoadCreative(void* node, void* target, char* name,
 
 unsigned int CVASTParser::LoadCreativeAttributes(void* node, AdCreative* creative) {
     if (node == nullptr || creative == nullptr) return KA_OK;
-    static const XMLAttributeName kNames[] = {"id", "sequence", "adId"};
+    static constexpr auto kNames = ka::AttributeNames("id", "sequence", "adId");
     XMLAttributeValue values[3];
     ReadAttributes(node, kNames, values);
     CopyAttribute(values[0], creative->id);
-    if (values[1].Present()) creative->sequence = atoi(values[1].value);
+    if (values[1].Present()) creative->sequence = ka::Atoi(values[1].value);
     CopyAttribute(values[2], creative->adId);
     return KA_OK;
 }

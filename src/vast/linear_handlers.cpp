@@ -1,5 +1,4 @@
 // Handlers of <Linear> and the lists below it: media files, video clicks, tracking events.
-#include <cstdlib>
 #include <cstring>
 
 #include "ka/result_codes.h"
@@ -17,7 +16,7 @@ bool IsPercent(const char* value, int length) {
 
 // atoi of an attribute into field when the attribute is present.
 void ReadNumber(const XMLAttributeValue& attribute, int32_t& field) {
-    if (attribute.Present()) field = atoi(attribute.value);
+    if (attribute.Present()) field = ka::Atoi(attribute.value);
 }
 
 // A click element appended to one of the lists of an AdVideoClicks.
@@ -100,17 +99,9 @@ unsigned int CVASTParser::LoadMediaFilesTag(void* node, void* target, char* name
 unsigned int CVASTParser::LoadMediaFileAttributes(void* node, AdMediaFile* mediaFile) {
     if (node == nullptr || mediaFile == nullptr) return KA_OK;
     // Media files carry most of their attributes: all are read in one pass, in this order.
-    static const XMLAttributeName kNames[] = {"delivery",
-                                              "type",
-                                              "width",
-                                              "height",
-                                              "codec",
-                                              "id",
-                                              "bitrate",
-                                              "minBitrate",
-                                              "maxBitrate",
-                                              "scalable",
-                                              "maintainAspectRatio"};
+    static constexpr auto kNames =
+        ka::AttributeNames("delivery", "type", "width", "height", "codec", "id", "bitrate",
+                           "minBitrate", "maxBitrate", "scalable", "maintainAspectRatio");
     XMLAttributeValue values[11];
     ReadAttributes(node, kNames, values);
     if (values[0].Present()) {
@@ -165,7 +156,7 @@ unsigned int CVASTParser::LoadTrackingEventsTag(void* node, void* target, char* 
 
 unsigned int CVASTParser::LoadTrackingAttributes(void* node, AdTracking* tracking) {
     if (node == nullptr || tracking == nullptr) return KA_OK;
-    static const XMLAttributeName kNames[] = {"event", "offset"};
+    static constexpr auto kNames = ka::AttributeNames("event", "offset");
     XMLAttributeValue values[2];
     ReadAttributes(node, kNames, values);
     CopyAttribute(values[0], tracking->event);

@@ -290,7 +290,8 @@ void CVMAPParser::ReadContentUri(void* extensions) {
 
 unsigned int CVMAPParser::ParseAdBreakAttributes(void* node, AdBreak* adBreak) {
     if (node == nullptr || adBreak == nullptr) return KA_OK;
-    static const XMLAttributeName kNames[] = {"breakType", "breakId", "timeOffset", "repeatAfter"};
+    static constexpr auto kNames =
+        ka::AttributeNames("breakType", "breakId", "timeOffset", "repeatAfter");
     XMLAttributeValue values[4];
     ReadAttributes(node, kNames, values);
     if (values[0].Present()) {
@@ -326,7 +327,7 @@ unsigned int CVMAPParser::LoadAdBreakTag(void* node, void* target, char* name,
 
 unsigned int CVMAPParser::ParseAdSourceAttributes(void* node, AdSource* source) {
     if (node == nullptr || source == nullptr) return KA_OK;
-    static const XMLAttributeName kNames[] = {"id", "allowMultipleAds", "followRedirects"};
+    static constexpr auto kNames = ka::AttributeNames("id", "allowMultipleAds", "followRedirects");
     XMLAttributeValue values[3];
     ReadAttributes(node, kNames, values);
     if (values[0].Present()) source->id = ka::ParseDecimal(values[0].value);

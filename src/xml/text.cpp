@@ -1,6 +1,7 @@
 #include "xml/text.h"
 
 #include <climits>
+#include <cstdint>
 #include <cstring>
 
 #include "ka/result_codes.h"
@@ -70,6 +71,26 @@ int ParseDecimal(const char* text) {
     if (value > INT_MAX) return INT_MAX;
     if (value < INT_MIN) return INT_MIN;
     return static_cast<int>(value);
+}
+
+int Atoi(const char* text) {
+    const char* p = text;
+    while (IsSpace(*p)) ++p;
+    bool negative = false;
+    if (*p == '+' || *p == '-') {
+        negative = *p == '-';
+        ++p;
+    }
+    // strtol stops growing the magnitude at the end of the long range and answers that end.
+    const unsigned long limit = negative ? static_cast<unsigned long>(LONG_MAX) + 1 : LONG_MAX;
+    unsigned long magnitude = 0;
+    for (; *p >= '0' && *p <= '9'; ++p) {
+        const unsigned long digit = static_cast<unsigned long>(*p - '0');
+        magnitude = magnitude > (limit - digit) / 10 ? limit : magnitude * 10 + digit;
+    }
+    const unsigned long bits = negative ? 0 - magnitude : magnitude;
+    // The low 32 bits as a signed int: what converting strtol's long to int gives.
+    return static_cast<int>(static_cast<uint32_t>(bits));
 }
 
 size_t CopyDecodingAmp(char* out, const char* text, size_t length) {

@@ -44,6 +44,9 @@ bool ScanDecimal(const char** cursor, int width, long long* value);
 // atoi's reading (leading white space, a sign, digits up to the first other character, 0
 // without digits), clamped to the int range instead of overflowing.
 int ParseDecimal(const char* text);
+// What atoi gives, without the locale machinery of strtol: the number read as strtol reads it
+// into a long (clamped to the long range), then taken as an int (its low 32 bits).
+int Atoi(const char* text);
 
 // Copies the first length characters of text into out (room for length + 1), turning every
 // "&amp;" into "&" as unescape_amp does, and terminates it; the length written.

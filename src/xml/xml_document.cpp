@@ -149,7 +149,8 @@ bool CXMLDocument::CopyAttribute(const XMLAttributeValue& value, char*& field) {
 }
 
 void CXMLDocument::ReadAttributeList(void* node, const XMLAttributeName* names,
-                                     XMLAttributeValue* values, size_t count) {
+                                     const uint32_t* byLength, XMLAttributeValue* values,
+                                     size_t count) {
     for (size_t i = 0; i < count; ++i) values[i] = XMLAttributeValue();
     // Which names have been met: the first attribute of a name is the one read.
     uint32_t seen = 0;
@@ -165,15 +166,23 @@ void CXMLDocument::ReadAttributeList(void* node, const XMLAttributeName* names,
         if (result != KA_OK && current == nullptr) break;  // no walk: looked up by name below
         if (result != KA_OK || next == nullptr) return;
         current = next;
-        if (name == nullptr) continue;
-        for (size_t i = 0; i < count; ++i) {
-            if ((seen & (1u << i)) == 0 && names[i].length == nameLength &&
-                memcmp(names[i].name, name, static_cast<size_t>(nameLength)) == 0) {
+        if (name == nullptr || nameLength < 1 || nameLength >= kXMLAttributeNameLimit) continue;
+        // Only the names of this length, mostly one or none; the rest of a name is compared only
+        // when its first character matches.
+        for (uint32_t candidates = byLength[nameLength]; candidates != 0;
+             candidates &= candidates - 1) {
+            const int i = __builtin_ctz(candidates);
+            const XMLAttributeName& wanted = names[i];
+            if (wanted.name[0] != name[0] ||
+                memcmp(wanted.name + 1, name + 1, static_cast<size_t>(nameLength - 1)) != 0) {
+                continue;
+            }
+            if ((seen & (1u << i)) == 0) {
                 seen |= 1u << i;
                 values[i].value = value;
                 values[i].length = valueLength;
-                break;
             }
+            break;
         }
     }
     for (size_t i = 0; i < count; ++i) {

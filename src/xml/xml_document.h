@@ -4,6 +4,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 
 #include "ka/result_codes.h"
 #include "platform/arena.h"
@@ -17,6 +18,34 @@ struct XMLAttributeName {
     const char* name;
     int length;
 };
+
+// Names of attributes are at most this long (bytes), for the table below.
+constexpr int kXMLAttributeNameLimit = 32;
+
+// The attributes one handler reads, with its names grouped by length: each attribute of an
+// element is compared only with the names of its own length, mostly one or none.
+template <size_t N>
+struct XMLAttributeNames {
+    XMLAttributeName names[N];
+    uint32_t byLength[kXMLAttributeNameLimit];  // bit i: names[i] has that length
+};
+
+// XMLAttributeNames of the given literals, built at compile time:
+//   static constexpr auto kNames = ka::AttributeNames("id", "sequence");
+namespace ka {
+template <typename... Literals>
+constexpr XMLAttributeNames<sizeof...(Literals)> AttributeNames(const Literals&... literals) {
+    static_assert(sizeof...(Literals) <= 32, "one bit per name");
+    XMLAttributeNames<sizeof...(Literals)> set = {{XMLAttributeName(literals)...}, {}};
+    for (size_t i = 0; i < sizeof...(Literals); ++i) {
+        const int length = set.names[i].length;
+        // A name too long for the table is refused where the set is built.
+        set.byLength[length < kXMLAttributeNameLimit ? length : throw "attribute name too long"] |=
+            1u << i;
+    }
+    return set;
+}
+}  // namespace ka
 
 // An attribute's value as the module lends it: null and 0 when the element has none.
 struct XMLAttributeValue {
@@ -107,10 +136,9 @@ public:
     // values[i] is the first attribute called names[i], as GetAttributeValue would find it. A
     // module that does not walk attributes is asked once per name instead.
     template <size_t N>
-    void ReadAttributes(void* node, const XMLAttributeName (&names)[N],
+    void ReadAttributes(void* node, const XMLAttributeNames<N>& names,
                         XMLAttributeValue (&values)[N]) {
-        static_assert(N <= 32, "one bit per name");
-        ReadAttributeList(node, names, values, N);
+        ReadAttributeList(node, names.names, names.byLength, values, N);
     }
 
     void* mXMLHandle;
@@ -141,8 +169,8 @@ protected:
     }
 
 private:
-    void ReadAttributeList(void* node, const XMLAttributeName* names, XMLAttributeValue* values,
-                           size_t count);
+    void ReadAttributeList(void* node, const XMLAttributeName* names, const uint32_t* byLength,
+                           XMLAttributeValue* values, size_t count);
 
     bool mBorrowedXML;  // mXMLHandle and mXMLAPI are another object's
 };
