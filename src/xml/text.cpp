@@ -83,10 +83,16 @@ int Atoi(const char* text) {
     }
     // strtol stops growing the magnitude at the end of the long range and answers that end.
     const unsigned long limit = negative ? static_cast<unsigned long>(LONG_MAX) + 1 : LONG_MAX;
+    // Below this, another digit cannot pass the limit: the common case needs no test.
+    constexpr unsigned long kSafe = LONG_MAX / 10 - 1;
     unsigned long magnitude = 0;
     for (; *p >= '0' && *p <= '9'; ++p) {
         const unsigned long digit = static_cast<unsigned long>(*p - '0');
-        magnitude = magnitude > (limit - digit) / 10 ? limit : magnitude * 10 + digit;
+        if (magnitude < kSafe) {
+            magnitude = magnitude * 10 + digit;
+        } else {
+            magnitude = magnitude > (limit - digit) / 10 ? limit : magnitude * 10 + digit;
+        }
     }
     const unsigned long bits = negative ? 0 - magnitude : magnitude;
     // The low 32 bits as a signed int: what converting strtol's long to int gives.

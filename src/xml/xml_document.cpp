@@ -12,6 +12,30 @@ constexpr char kModuleName[] = "kaXMLParser";
 constexpr char kModuleExtension[] = ".so";
 constexpr char kEntryName[] = "kaXMLGetParserAPI";
 
+template <typename Word>
+Word Load(const char* at) {
+    Word word;
+    memcpy(&word, at, sizeof(word));
+    return word;
+}
+
+// Whether length (1 to 31) bytes at a and b are the same. Attribute names are short: a few word
+// comparisons, the last one overlapping, cost less than a call to memcmp or a byte loop, and
+// read nothing past the length.
+bool SameBytes(const char* a, const char* b, int length) {
+    if (length >= 8) {
+        for (int i = 0; i + 8 < length; i += 8) {
+            if (Load<uint64_t>(a + i) != Load<uint64_t>(b + i)) return false;
+        }
+        return Load<uint64_t>(a + length - 8) == Load<uint64_t>(b + length - 8);
+    }
+    if (length >= 4) {
+        return Load<uint32_t>(a) == Load<uint32_t>(b) &&
+               Load<uint32_t>(a + length - 4) == Load<uint32_t>(b + length - 4);
+    }
+    return a[0] == b[0] && a[length / 2] == b[length / 2] && a[length - 1] == b[length - 1];
+}
+
 }  // namespace
 
 CXMLDocument::CXMLDocument() : mXMLHandle(nullptr), mArena(nullptr), mBorrowedXML(false) {
@@ -151,39 +175,39 @@ bool CXMLDocument::CopyAttribute(const XMLAttributeValue& value, char*& field) {
 void CXMLDocument::ReadAttributeList(void* node, const XMLAttributeName* names,
                                      const uint32_t* byLength, XMLAttributeValue* values,
                                      size_t count) {
-    for (size_t i = 0; i < count; ++i) values[i] = XMLAttributeValue();
-    // Which names have been met: the first attribute of a name is the one read.
-    uint32_t seen = 0;
-    void* current = nullptr;
-    for (;;) {
-        void* next = nullptr;
-        char* name = nullptr;
-        char* value = nullptr;
-        int nameLength = 0;
-        int valueLength = 0;
-        const unsigned int result =
-            GetNextAttribute(node, &next, current, &name, nameLength, &value, valueLength);
-        if (result != KA_OK && current == nullptr) break;  // no walk: looked up by name below
-        if (result != KA_OK || next == nullptr) return;
-        current = next;
-        if (name == nullptr || nameLength < 1 || nameLength >= kXMLAttributeNameLimit) continue;
-        // Only the names of this length, mostly one or none; the rest of a name is compared only
-        // when its first character matches.
-        for (uint32_t candidates = byLength[nameLength]; candidates != 0;
-             candidates &= candidates - 1) {
-            const int i = __builtin_ctz(candidates);
-            const XMLAttributeName& wanted = names[i];
-            if (wanted.name[0] != name[0] ||
-                memcmp(wanted.name + 1, name + 1, static_cast<size_t>(nameLength - 1)) != 0) {
-                continue;
+    const auto nextAttribute = mXMLAPI.GetNextAttribute;
+    if (mXMLHandle != nullptr && nextAttribute != nullptr) {
+        // Which names have been met: the first attribute of a name is the one read, and the
+        // walk ends once every name has been met.
+        const uint32_t all = count == 32 ? ~0u : (1u << count) - 1;
+        uint32_t seen = 0;
+        void* current = nullptr;
+        while (seen != all) {
+            void* next = nullptr;
+            char* name = nullptr;
+            char* value = nullptr;
+            int nameLength = 0;
+            int valueLength = 0;
+            const unsigned int result = nextAttribute(mXMLHandle, node, &next, current, &name,
+                                                      &nameLength, &value, &valueLength);
+            if (result != KA_OK && current == nullptr) break;  // no walk: looked up by name
+            if (result != KA_OK || next == nullptr) return;
+            current = next;
+            if (name == nullptr || nameLength < 1 || nameLength >= kXMLAttributeNameLimit) continue;
+            // Only the names of this length, mostly one or none.
+            for (uint32_t candidates = byLength[nameLength]; candidates != 0;
+                 candidates &= candidates - 1) {
+                const int i = __builtin_ctz(candidates);
+                if (!SameBytes(names[i].name, name, nameLength)) continue;
+                if ((seen & (1u << i)) == 0) {
+                    seen |= 1u << i;
+                    values[i].value = value;
+                    values[i].length = valueLength;
+                }
+                break;
             }
-            if ((seen & (1u << i)) == 0) {
-                seen |= 1u << i;
-                values[i].value = value;
-                values[i].length = valueLength;
-            }
-            break;
         }
+        if (seen == all) return;
     }
     for (size_t i = 0; i < count; ++i) {
         GetAttributeValue(node, const_cast<char*>(names[i].name), &values[i].value,

@@ -133,8 +133,9 @@ public:
     // Field := a copy (in mArena) of value when it is present; true when it did.
     bool CopyAttribute(const XMLAttributeValue& value, char*& field);
     // Reads the attributes of node named in names in one pass over the element's attributes:
-    // values[i] is the first attribute called names[i], as GetAttributeValue would find it. A
-    // module that does not walk attributes is asked once per name instead.
+    // values[i] (empty when given) becomes the first attribute called names[i], as
+    // GetAttributeValue would find it. A module that does not walk attributes is asked once per
+    // name instead.
     template <size_t N>
     void ReadAttributes(void* node, const XMLAttributeNames<N>& names,
                         XMLAttributeValue (&values)[N]) {
