@@ -19,10 +19,6 @@ constexpr long long kDecimalCeiling = static_cast<long long>(INT_MAX) + 1;
 
 namespace ka {
 
-bool IsCDataSection(const char* text) {
-    return text[0] == kXmlCDataOpen[0] && strncmp(text, kXmlCDataOpen, kXmlCDataOpenLength) == 0;
-}
-
 bool CDataContent(const char* text, size_t length, size_t* begin, size_t* count) {
     // The opening ends in '[' and the closing holds none, so the two never overlap.
     if (length < kXmlCDataOpenLength + kXmlCDataCloseLength ||

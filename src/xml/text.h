@@ -31,8 +31,11 @@ inline bool NameIs(const char* name, unsigned int length, const char* literal) {
     return length == n && memcmp(name, literal, n) == 0;
 }
 
-// True when text begins with the "![CDATA[" opening, whether or not the section closes.
-bool IsCDataSection(const char* text);
+// True when text begins with the "![CDATA[" opening, whether or not the section closes. Inline:
+// every element text is tested, and most fail at the first character.
+inline bool IsCDataSection(const char* text) {
+    return text[0] == kXmlCDataOpen[0] && strncmp(text, kXmlCDataOpen, kXmlCDataOpenLength) == 0;
+}
 // Where the trimmed content of a complete raw "![CDATA[...]]" section of length bytes begins and
 // how long it is; false (outputs untouched) when text is not such a section.
 bool CDataContent(const char* text, size_t length, size_t* begin, size_t* count);

@@ -12,6 +12,9 @@ constexpr char kModuleName[] = "kaXMLParser";
 constexpr char kModuleExtension[] = ".so";
 constexpr char kEntryName[] = "kaXMLGetParserAPI";
 
+// Handlers that read at most this many attributes look each one up by name.
+constexpr size_t kLookedUpNames = 2;
+
 template <typename Word>
 Word Load(const char* at) {
     Word word;
@@ -176,7 +179,9 @@ void CXMLDocument::ReadAttributeList(void* node, const XMLAttributeName* names,
                                      const uint32_t* byLength, XMLAttributeValue* values,
                                      size_t count) {
     const auto nextAttribute = mXMLAPI.GetNextAttribute;
-    if (mXMLHandle != nullptr && nextAttribute != nullptr) {
+    // Two names cost two lookups, no more calls than a pass over an element that has one of
+    // them, and no comparisons here.
+    if (count > kLookedUpNames && mXMLHandle != nullptr && nextAttribute != nullptr) {
         // Which names have been met: the first attribute of a name is the one read, and the
         // walk ends once every name has been met.
         const uint32_t all = count == 32 ? ~0u : (1u << count) - 1;
