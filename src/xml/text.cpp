@@ -15,6 +15,33 @@ constexpr size_t kAmpEntityLength = sizeof(kAmpEntity) - 1;
 // Past this a decimal magnitude stops growing: it already clamps to either end of int.
 constexpr long long kDecimalCeiling = static_cast<long long>(INT_MAX) + 1;
 
+// ScanDecimal's reading, inlined where string2time reads its four fields.
+__attribute__((always_inline)) inline bool ScanDecimalInline(const char** cursor, int width,
+                                                             long long* value) {
+    const char* p = *cursor;
+    while (ka::IsSpace(*p)) ++p;
+    int left = width;
+    bool negative = false;
+    if (*p == '+' || *p == '-') {
+        negative = *p == '-';
+        ++p;
+        --left;
+    }
+    long long result = 0;
+    int digits = 0;
+    while (left > 0 && *p >= '0' && *p <= '9') {
+        result = result * 10 + (*p - '0');
+        if (result > kDecimalCeiling) result = kDecimalCeiling;
+        ++p;
+        --left;
+        ++digits;
+    }
+    if (digits == 0) return false;
+    *value = negative ? -result : result;
+    *cursor = p;
+    return true;
+}
+
 }  // namespace
 
 namespace ka {
@@ -36,28 +63,7 @@ bool CDataContent(const char* text, size_t length, size_t* begin, size_t* count)
 }
 
 bool ScanDecimal(const char** cursor, int width, long long* value) {
-    const char* p = *cursor;
-    while (IsSpace(*p)) ++p;
-    int left = width;
-    bool negative = false;
-    if (*p == '+' || *p == '-') {
-        negative = *p == '-';
-        ++p;
-        --left;
-    }
-    long long result = 0;
-    int digits = 0;
-    while (left > 0 && *p >= '0' && *p <= '9') {
-        result = result * 10 + (*p - '0');
-        if (result > kDecimalCeiling) result = kDecimalCeiling;
-        ++p;
-        --left;
-        ++digits;
-    }
-    if (digits == 0) return false;
-    *value = negative ? -result : result;
-    *cursor = p;
-    return true;
+    return ScanDecimalInline(cursor, width, value);
 }
 
 int ParseDecimal(const char* text) {
@@ -170,7 +176,7 @@ unsigned int string2time(const char* text, int length) {
     const char separators[4] = {':', ':', '.', '\0'};
     const char* cursor = text;
     for (int i = 0; i < 4; ++i) {
-        if (!ka::ScanDecimal(&cursor, widths[i], &fields[i])) break;
+        if (!ScanDecimalInline(&cursor, widths[i], &fields[i])) break;
         if (separators[i] == '\0' || *cursor != separators[i]) break;
         ++cursor;
     }
