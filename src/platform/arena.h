@@ -13,6 +13,8 @@
 #include <cstring>
 #include <type_traits>
 
+#include "platform/limits.h"
+
 namespace ka {
 
 class Arena {
@@ -70,14 +72,11 @@ public:
 
     // The largest alignment handed out: that of every record.
     static constexpr size_t kAlignment = 16;
-    // The first chunk; each new one is as large as all before it together, up to kMaxChunk.
-    static constexpr size_t kFirstChunk = 1024;
-    static constexpr size_t kMaxChunk = 64 * 1024;
-    // A request larger than this gets a block of its own, freed at the next Reset: a long text
-    // neither makes a chunk unbounded nor wastes the rest of one.
-    static constexpr size_t kOwnBlockBytes = 4 * 1024;
-    // What Reset keeps for the next Process; a larger set of records is rebuilt in fresh chunks.
-    static constexpr size_t kKeptBytes = 2 * 1024 * 1024;
+    // Chunk sizes and what Reset keeps: platform/limits.h.
+    static constexpr size_t kFirstChunk = kArenaFirstChunk;
+    static constexpr size_t kMaxChunk = kArenaMaxChunk;
+    static constexpr size_t kOwnBlockBytes = kArenaOwnBlockBytes;
+    static constexpr size_t kKeptBytes = kArenaKeptBytes;
 
 private:
     // The header of a chunk or own block; its memory follows, aligned to kAlignment.
