@@ -32,7 +32,29 @@ void ReplaceAll(std::string& text, const std::string& from, const std::string& t
     }
 }
 
+std::string gLibPath = KA_LIB_PATH;
+std::string gModulesDir = KA_MODULES_DIR;
+
 }  // namespace
+
+void TakePathOptions(int& argc, char** argv) {
+    int kept = 1;
+    for (int i = 1; i < argc; ++i) {
+        const std::string arg = argv[i];
+        if ((arg == "--lib" || arg == "--modules") && i + 1 < argc) {
+            (arg == "--lib" ? gLibPath : gModulesDir) = argv[++i];
+        } else {
+            argv[kept++] = argv[i];
+        }
+    }
+    argc = kept;
+}
+
+size_t Document::Bytes() const {
+    size_t bytes = 0;
+    for (const std::string& buffer : buffers) bytes += buffer.size();
+    return bytes;
+}
 
 std::string MakePlaylist(const std::string& vastDocument, int breaks) {
     const size_t begin = vastDocument.find("<Ad ");
@@ -84,9 +106,13 @@ const std::vector<Document>& Documents() {
     static const std::vector<Document> documents = [] {
         const std::string vast = ReadFile(KA_BENCH_DATA_DIR "vast_inline_4k.xml");
         return std::vector<Document>{
-            {"vast_4k", vast, true},
-            {"vmap_40k", ReadFile(KA_BENCH_DATA_DIR "vmap_six_breaks_40k.xml"), false},
-            {"playlist_1m", MakePlaylist(vast, 200), false},
+            {"vast_2k_3k",
+             {ReadFile(KA_BENCH_DATA_DIR "vast_inline_2k.xml"),
+              ReadFile(KA_BENCH_DATA_DIR "vast_inline_3k.xml")},
+             true},
+            {"vast_4k", {vast}, true},
+            {"vmap_40k", {ReadFile(KA_BENCH_DATA_DIR "vmap_six_breaks_40k.xml")}, false},
+            {"playlist_1m", {MakePlaylist(vast, 200)}, false},
         };
     }();
     return documents;
@@ -94,10 +120,10 @@ const std::vector<Document>& Documents() {
 
 const VMAPParserAPI& Library() {
     static const VMAPParserAPI api = [] {
-        void* library = dlopen(KA_LIB_PATH, RTLD_NOW | RTLD_LOCAL);
+        void* library = dlopen(gLibPath.c_str(), RTLD_NOW | RTLD_LOCAL);
         if (library == nullptr) Fail(std::string("dlopen: ") + dlerror());
         auto get = reinterpret_cast<KaGetVMAPParserAPIFn>(dlsym(library, "kaGetVMAPParserAPI"));
-        if (get == nullptr) Fail("no kaGetVMAPParserAPI in " KA_LIB_PATH);
+        if (get == nullptr) Fail("no kaGetVMAPParserAPI in " + gLibPath);
         VMAPParserAPI table{};
         if (get(&table) != 0) Fail("kaGetVMAPParserAPI failed");
         return table;
@@ -106,9 +132,8 @@ const VMAPParserAPI& Library() {
 }
 
 ParserHandle::ParserHandle(bool vastOnly) {
-    // Open keeps the path by pointer: a literal lives as long as the program.
-    static char workPath[] = KA_MODULES_DIR;
-    if (Library().Open(&mHandle, workPath) != 0 || mHandle == nullptr) Fail("Open failed");
+    // Open keeps the path by pointer: the string lives as long as the program.
+    if (Library().Open(&mHandle, &gModulesDir[0]) != 0 || mHandle == nullptr) Fail("Open failed");
     if (vastOnly) Library().SetParam(mHandle, KA_PID_VMAP_VAST_ONLY, reinterpret_cast<void*>(1));
 }
 
@@ -119,8 +144,16 @@ uint32_t ParserHandle::Process(const std::string& document) {
                              static_cast<uint32_t>(document.size()));
 }
 
+uint32_t ParserHandle::ProcessAll(const Document& document) {
+    uint32_t failed = 0;
+    for (const std::string& buffer : document.buffers) {
+        if (const uint32_t result = Process(buffer)) failed = result;
+    }
+    return failed;
+}
+
 void AllowLocalFiles(const char* baseDir) {
-    void* module = dlopen(KA_MODULES_DIR "libkaSourceIO.so", RTLD_NOW | RTLD_LOCAL);
+    void* module = dlopen((gModulesDir + "libkaSourceIO.so").c_str(), RTLD_NOW | RTLD_LOCAL);
     if (module == nullptr) Fail(std::string("dlopen: ") + dlerror());
     auto entry = reinterpret_cast<KaGetSourceIOAPIFn>(dlsym(module, "kaGetSourceIOAPI"));
     static SourceIOApi api = {};
@@ -131,7 +164,7 @@ void AllowLocalFiles(const char* baseDir) {
 }
 
 XmlModule::XmlModule() {
-    mLibrary = dlopen(KA_MODULES_DIR "libkaXMLParser.so", RTLD_NOW | RTLD_LOCAL);
+    mLibrary = dlopen((gModulesDir + "libkaXMLParser.so").c_str(), RTLD_NOW | RTLD_LOCAL);
     if (mLibrary == nullptr) Fail(std::string("dlopen: ") + dlerror());
     auto get = reinterpret_cast<KaXMLGetParserAPIFn>(dlsym(mLibrary, "kaXMLGetParserAPI"));
     if (get == nullptr || get(&mApi) != 0 || mApi.Init == nullptr) Fail("no XML module table");
@@ -148,6 +181,14 @@ unsigned int XmlModule::Load(const std::string& document) {
     // The library's load mode: the module may make something of it.
     return mApi.LoadXML(mHandle, const_cast<char*>(document.data()),
                         static_cast<int>(document.size()), 160);
+}
+
+unsigned int XmlModule::LoadAll(const Document& document) {
+    unsigned int failed = 0;
+    for (const std::string& buffer : document.buffers) {
+        if (const unsigned int result = Load(buffer)) failed = result;
+    }
+    return failed;
 }
 
 void KeepingReporter::ReportRuns(const std::vector<Run>& runs) {

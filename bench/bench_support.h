@@ -1,4 +1,4 @@
-// What the benchmark programs share: the three measured documents, the library reached as a
+// What the benchmark programs share: the four measured documents, the library reached as a
 // player reaches it (dlopen, kaGetVMAPParserAPI, Open with the modules folder), and the XML
 // module reached directly, for the time and memory of its own load of the same buffer.
 #pragma once
@@ -15,20 +15,28 @@
 
 namespace bench {
 
+// One measured case: its buffers are read in turn, each once per iteration, on one handle.
 struct Document {
     std::string name;
-    std::string bytes;
-    bool vastOnly;  // a bare VAST document, processed in VAST-only mode
+    std::vector<std::string> buffers;
+    bool vastOnly;         // bare VAST documents, processed in VAST-only mode
+    size_t Bytes() const;  // of all buffers
 };
 
-// The three documents: a 4 KB VAST InLine, a 40 KB VMAP of six inline-VAST breaks, and a 1 MB
-// playlist of 200 breaks generated on first use. Exits the program when a file is missing.
+// The four cases: two VAST InLine responses of 2 and 3 KB in turn (what ad servers mostly
+// send), a 4 KB VAST InLine, a 40 KB VMAP of six inline-VAST breaks, and a 1 MB playlist of 200
+// breaks generated on first use. Exits the program when a file is missing.
 const std::vector<Document>& Documents();
+
+// Takes "--lib PATH" (the library) and "--modules DIR" (its modules folder, ending with "/")
+// out of the arguments; without them this build's own are used. Call before anything loads.
+void TakePathOptions(int& argc, char** argv);
 
 // The 1 MB playlist: breaks copies of one inline-VAST break, each with its own identifiers.
 std::string MakePlaylist(const std::string& vastDocument, int breaks);
 
-// The parser's table from KA_LIB_PATH; the library stays loaded for the program's lifetime.
+// The parser's table from the library (KA_LIB_PATH or --lib); it stays loaded for the program's
+// lifetime.
 const VMAPParserAPI& Library();
 
 // As the host does for a local document: the source-IO module instance the library loads (the
@@ -43,12 +51,15 @@ public:
     ParserHandle(const ParserHandle&) = delete;
     ParserHandle& operator=(const ParserHandle&) = delete;
     uint32_t Process(const std::string& document);
+    // Each buffer of the case once; the last result that was not 0, else 0.
+    uint32_t ProcessAll(const Document& document);
 
 private:
     void* mHandle = nullptr;
 };
 
-// The XML module from KA_MODULES_DIR, loaded directly, with one handle of its own.
+// The XML module of the modules folder (KA_MODULES_DIR or --modules), loaded directly, with one
+// handle of its own.
 class XmlModule {
 public:
     XmlModule();
@@ -56,6 +67,7 @@ public:
     XmlModule(const XmlModule&) = delete;
     XmlModule& operator=(const XmlModule&) = delete;
     unsigned int Load(const std::string& document);
+    unsigned int LoadAll(const Document& document);
 
 private:
     void* mLibrary = nullptr;

@@ -1,4 +1,9 @@
-// Bytes allocated by one Process of each document, against the document's size. The program
+// Bytes allocated by one Process of each document, against the document's size (per document
+// for a case of two documents read in turn).
+//
+//   memory_bench [--lib PATH] [--modules DIR] [benchmark options]   (DIR ends with "/")
+//
+// The program
 // replaces malloc and its family: the library, the XML module and pugixml are loaded into this
 // process, and every heap allocation of theirs (operator new included, which the C++ runtime
 // serves from malloc) resolves to the definitions below. Counting is on only around the
@@ -106,54 +111,57 @@ Measure Count(Call call) {
     return Measure{gTally, gTally.live};
 }
 
-void SetCounters(benchmark::State& state, const Measure& m, size_t documentSize) {
-    state.counters["allocs"] = static_cast<double>(m.tally.calls);
-    state.counters["bytes"] = static_cast<double>(m.tally.bytes);
+// Allocations and bytes per document of the measured calls (count of them, one per document).
+void SetCounters(benchmark::State& state, const Measure& m, size_t documentSize, size_t count) {
+    state.counters["allocs"] = static_cast<double>(m.tally.calls) / count;
+    state.counters["bytes"] = static_cast<double>(m.tally.bytes) / count;
     state.counters["per_doc_byte"] = static_cast<double>(m.tally.bytes) / documentSize;
     state.counters["peak"] = static_cast<double>(m.tally.peak);
     state.counters["held"] = static_cast<double>(m.heldAfter);
 }
 
-// One Process on a handle that has processed the same document before: what every further
+// One Process of each document on a handle that has processed them before: what every further
 // Process allocates (the previous records are freed inside the same call).
 void ProcessAgain(benchmark::State& state, const bench::Document* document) {
     bench::ParserHandle handle(document->vastOnly);
-    if (handle.Process(document->bytes) != 0) {
+    if (handle.ProcessAll(*document) != 0) {
         state.SkipWithError("Process failed");
         return;
     }
     Measure m;
     for (auto _ : state) {
-        m = Count([&] { handle.Process(document->bytes); });
+        m = Count([&] { handle.ProcessAll(*document); });
     }
-    SetCounters(state, m, document->bytes.size());
+    SetCounters(state, m, document->Bytes(), document->buffers.size());
 }
 
-// The first Process of a fresh handle: "held" is then what the handle keeps for the records
-// (and the module for its document) until the next Process.
+// The first Process of a fresh handle, on the case's first document: "held" is then what the
+// handle keeps for the records (and the module for its document) until the next Process.
 void ProcessFirst(benchmark::State& state, const bench::Document* document) {
+    const std::string& first = document->buffers.front();
     Measure m;
     for (auto _ : state) {
         bench::ParserHandle handle(document->vastOnly);
-        m = Count([&] { handle.Process(document->bytes); });
+        m = Count([&] { handle.Process(first); });
     }
-    SetCounters(state, m, document->bytes.size());
+    SetCounters(state, m, first.size(), 1);
 }
 
-// The XML module's own load of the same buffer, repeated on one handle.
+// The XML module's own load of the same buffers, repeated on one handle.
 void LoadAgain(benchmark::State& state, const bench::Document* document) {
     bench::XmlModule module;
-    module.Load(document->bytes);
+    module.LoadAll(*document);
     Measure m;
     for (auto _ : state) {
-        m = Count([&] { module.Load(document->bytes); });
+        m = Count([&] { module.LoadAll(*document); });
     }
-    SetCounters(state, m, document->bytes.size());
+    SetCounters(state, m, document->Bytes(), document->buffers.size());
 }
 
 }  // namespace
 
 int main(int argc, char** argv) {
+    bench::TakePathOptions(argc, argv);
     for (const bench::Document& document : bench::Documents()) {
         benchmark::RegisterBenchmark(("ProcessAgain/" + document.name).c_str(), ProcessAgain,
                                      &document)
@@ -180,11 +188,12 @@ int main(int argc, char** argv) {
         const std::string first = "ProcessFirst/" + document.name;
         const std::string load = "LoadAgain/" + document.name;
         printf("%-12s %9zu | %7.0f %10.0f %6.2f %10.0f | %10.0f %13.0f | %7.0f %10.0f %6.2f\n",
-               document.name.c_str(), document.bytes.size(), reporter.Counter(again, "allocs"),
-               reporter.Counter(again, "bytes"), reporter.Counter(again, "per_doc_byte"),
-               reporter.Counter(again, "peak"), reporter.Counter(first, "bytes"),
-               reporter.Counter(first, "held"), reporter.Counter(load, "allocs"),
-               reporter.Counter(load, "bytes"), reporter.Counter(load, "per_doc_byte"));
+               document.name.c_str(), document.Bytes() / document.buffers.size(),
+               reporter.Counter(again, "allocs"), reporter.Counter(again, "bytes"),
+               reporter.Counter(again, "per_doc_byte"), reporter.Counter(again, "peak"),
+               reporter.Counter(first, "bytes"), reporter.Counter(first, "held"),
+               reporter.Counter(load, "allocs"), reporter.Counter(load, "bytes"),
+               reporter.Counter(load, "per_doc_byte"));
     }
     return 0;
 }

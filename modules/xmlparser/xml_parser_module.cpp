@@ -165,35 +165,41 @@ unsigned int GetAttributeValue(void* handle, void* node, char* name, char** valu
     return KA_OK;
 }
 
+// The attribute after current among element's own, the first one for a null current; null when
+// there is none or current is not one of them. Compared as addresses, so that a stranger's
+// pointer is recognised without arithmetic on it: one below the first wraps to a large offset.
+const Attribute* AttributeAfter(const Element* element, const void* current) {
+    const size_t count = static_cast<size_t>(element->attributeCount);
+    if (current == nullptr) return count > 0 ? element->attributes : nullptr;
+    const uintptr_t offset =
+        reinterpret_cast<uintptr_t>(current) - reinterpret_cast<uintptr_t>(element->attributes);
+    if (offset % sizeof(Attribute) != 0) return nullptr;
+    const size_t index = offset / sizeof(Attribute) + 1;
+    return index < count ? element->attributes + index : nullptr;
+}
+
 // Walks an element's attributes in document order: a null current gives the first one, an
-// attribute this operation returned for the same node gives the one after it.
+// attribute this operation returned for the same node gives the one after it. The library reads
+// every attribute of an element this way, so the answer costs a few stores.
 unsigned int GetNextAttribute(void* handle, void* node, void** next, void* current, char** name,
                               int* nameLength, char** value, int* valueLength) {
-    ClearNode(next);
-    ClearString(name, nameLength);
-    ClearString(value, valueLength);
     if (handle == nullptr || node == nullptr || next == nullptr || name == nullptr ||
         nameLength == nullptr || value == nullptr || valueLength == nullptr) {
+        ClearNode(next);
+        ClearString(name, nameLength);
+        ClearString(value, valueLength);
         return KA_ERR_NULL_ARGUMENT;
     }
-    const Element* element = AsElement(node);
-    int index = 0;
-    if (current != nullptr) {
-        // Compared as addresses, so that a stranger's pointer is recognised without arithmetic
-        // on it.
-        const uintptr_t first = reinterpret_cast<uintptr_t>(element->attributes);
-        const uintptr_t at = reinterpret_cast<uintptr_t>(current);
-        const uintptr_t end =
-            first + sizeof(Attribute) * static_cast<size_t>(element->attributeCount);
-        if (at < first || at >= end || (at - first) % sizeof(Attribute) != 0) return KA_OK;
-        index = static_cast<int>((at - first) / sizeof(Attribute)) + 1;
+    const Attribute* attribute = AttributeAfter(AsElement(node), current);
+    if (attribute == nullptr) {
+        *next = nullptr;
+        ClearString(name, nameLength);
+        ClearString(value, valueLength);
+        return KA_OK;
     }
-    if (index < element->attributeCount) {
-        const Attribute& attribute = element->attributes[index];
-        *next = const_cast<Attribute*>(&attribute);
-        SetString(attribute.name, attribute.nameLength, name, nameLength);
-        SetString(attribute.value, attribute.valueLength, value, valueLength);
-    }
+    *next = const_cast<Attribute*>(attribute);
+    SetString(attribute->name, attribute->nameLength, name, nameLength);
+    SetString(attribute->value, attribute->valueLength, value, valueLength);
     return KA_OK;
 }
 

@@ -28,7 +28,8 @@ struct XMLParserAPI {
     // Raw attribute value (entities not decoded) and its length; null and 0 when absent.
     unsigned int (*GetAttributeValue)(void* handle, void* node, char* name, char** value,
                                       int* length);
-    // Attribute iteration; the library never calls it.
+    // Attribute iteration: a null current gives the first attribute, one this operation gave
+    // the next; next is null past the last. The library reads attributes in one pass with it.
     unsigned int (*GetNextAttribute)(void* handle, void* node, void** next, void* current,
                                      char** name, int* nameLength, char** value, int* valueLength);
     // Element text: the first text or CDATA child, trimmed; CDATA reads "![CDATA[...]]".

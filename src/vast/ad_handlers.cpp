@@ -1,6 +1,4 @@
 // Handlers of the document, <Ad>, <InLine> and <Wrapper> levels.
-#include <cstdlib>
-#include <memory>
 
 #include "ka/result_codes.h"
 #include "ka/vast_extension.h"
@@ -14,7 +12,7 @@ unsigned int CVASTParser::LoadVASTTag(void* node, void* target, char* name,
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
     VastAdData* data = static_cast<VastAdData*>(target);
     if (NameIs(name, nameLength, "Ad")) {
-        AdData* ad = new AdData();
+        AdData* ad = mArena->New<AdData>();
         mAdTail.Append(&data->firstAd, ad);
         data->adCount++;
         LoadAdAttributes(node, ad);
@@ -27,10 +25,11 @@ unsigned int CVASTParser::LoadVASTTag(void* node, void* target, char* name,
 
 unsigned int CVASTParser::LoadAdAttributes(void* node, AdData* ad) {
     if (node == nullptr || ad == nullptr) return KA_OK;
-    CopyAttribute(node, "id", ad->id);
-    char* value = nullptr;
-    int length = 0;
-    if (ReadAttribute(node, "sequence", &value, length)) ad->sequence = atoi(value);
+    static constexpr auto kNames = ka::AttributeNames("id", "sequence");
+    XMLAttributeValue values[2];
+    ReadAttributes(node, kNames, values);
+    CopyAttribute(values[0], ad->id);
+    if (values[1].Present()) ad->sequence = ka::Atoi(values[1].value);
     return KA_OK;
 }
 
@@ -41,12 +40,12 @@ unsigned int CVASTParser::LoadAdTag(void* node, void* target, char* name, unsign
     if (ad->body != nullptr) return KA_OK;
     if (NameIs(name, nameLength, "InLine")) {
         ad->type = AD_TYPE_INLINE;
-        AdInLine* inLine = new AdInLine();
+        AdInLine* inLine = mArena->New<AdInLine>();
         ad->body = inLine;
         LoadTag(node, inLine, &CVASTParser::LoadInLineTag);
     } else if (NameIs(name, nameLength, "Wrapper")) {
         ad->type = AD_TYPE_WRAPPER;
-        ad->body = new AdWrapper();
+        ad->body = mArena->New<AdWrapper>();
         LoadTag(node, ad, &CVASTParser::LoadWrapperTag);
     } else {
         // Any other child before the body marks the ad as InLine, still without a body.
@@ -60,13 +59,11 @@ namespace {
 // Element text of an <Impression> appended to list; empty texts add no node.
 void AppendImpression(CXMLDocument& doc, void* node, AdImpression** list,
                       ka::ListTail<AdImpression>& tail) {
-    char* text = nullptr;
-    doc.GetElementText(node, text);
-    // Held until the node that takes it exists: that allocation may fail.
-    std::unique_ptr<char[]> url(text);
+    char* url = nullptr;
+    doc.GetElementText(node, url);
     if (url == nullptr || url[0] == '\0') return;
-    AdImpression* impression = new AdImpression();
-    impression->url = url.release();
+    AdImpression* impression = doc.mArena->New<AdImpression>();
+    impression->url = url;
     tail.Append(list, impression);
 }
 

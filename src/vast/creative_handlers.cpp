@@ -1,5 +1,4 @@
 // Handlers of <Creatives> and <Creative>: one AdCreative per Creative element.
-#include <cstdlib>
 
 #include "ka/result_codes.h"
 #include "vast/vast_parser.h"
@@ -12,7 +11,7 @@ unsigned int CVASTParser::LoadCreative(void* node, void* target, char* name,
     // The error keeps other children out of the InLine's creativeCount.
     if (node == nullptr || target == nullptr || name == nullptr) return KA_ERR_LOAD_FAILED;
     if (!NameIs(name, nameLength, "Creative")) return KA_ERR_LOAD_FAILED;
-    AdCreative* creative = new AdCreative();
+    AdCreative* creative = mArena->New<AdCreative>();
     mCreativeTail.Append(static_cast<AdCreative**>(target), creative);
     LoadCreativeAttributes(node, creative);
     LoadTag(node, creative, &CVASTParser::LoadCreativeTag);
@@ -21,13 +20,12 @@ unsigned int CVASTParser::LoadCreative(void* node, void* target, char* name,
 
 unsigned int CVASTParser::LoadCreativeAttributes(void* node, AdCreative* creative) {
     if (node == nullptr || creative == nullptr) return KA_OK;
-    CopyAttribute(node, "id", creative->id);
-    char* value = nullptr;
-    int length = 0;
-    if (ReadAttribute(node, "sequence", &value, length)) {
-        creative->sequence = atoi(value);
-    }
-    CopyAttribute(node, "adId", creative->adId);
+    static constexpr auto kNames = ka::AttributeNames("id", "sequence", "adId");
+    XMLAttributeValue values[3];
+    ReadAttributes(node, kNames, values);
+    CopyAttribute(values[0], creative->id);
+    if (values[1].Present()) creative->sequence = ka::Atoi(values[1].value);
+    CopyAttribute(values[2], creative->adId);
     return KA_OK;
 }
 

@@ -1,5 +1,4 @@
 // Handlers of <Linear> and the lists below it: media files, video clicks, tracking events.
-#include <cstdlib>
 #include <cstring>
 
 #include "ka/result_codes.h"
@@ -16,17 +15,15 @@ bool IsPercent(const char* value, int length) {
 }
 
 // atoi of an attribute into field when the attribute is present.
-void ReadNumber(CXMLDocument& doc, void* node, const char* name, int32_t& field) {
-    char* value = nullptr;
-    int length = 0;
-    if (doc.ReadAttribute(node, name, &value, length)) field = atoi(value);
+void ReadNumber(const XMLAttributeValue& attribute, int32_t& field) {
+    if (attribute.Present()) field = ka::Atoi(attribute.value);
 }
 
 // A click element appended to one of the lists of an AdVideoClicks.
 void AppendClick(CXMLDocument& doc, void* node, uint32_t& count, AdClick** list,
                  ka::ListTail<AdClick>& tail) {
     count++;
-    AdClick* click = new AdClick();
+    AdClick* click = doc.mArena->New<AdClick>();
     tail.Append(list, click);
     doc.CopyAttribute(node, "id", click->id);
     doc.GetElementText(node, click->url);
@@ -48,13 +45,13 @@ unsigned int CVASTParser::LoadLinearTag(void* node, void* target, char* name,
     } else if (NameIs(name, nameLength, "VideoClicks")) {
         if (linear->videoClicks != nullptr) return KA_OK;
         linear->videoClicksCount = 1;
-        linear->videoClicks = new AdVideoClicks();
+        linear->videoClicks = mArena->New<AdVideoClicks>();
         LoadTag(node, linear->videoClicks, &CVASTParser::LoadVideoClicksTag);
     } else if (NameIs(name, nameLength, "AdParameters")) {
         // Only marked as present; the parameters are the ad unit's business.
         if (linear->adParameters != nullptr) return KA_OK;
         linear->adParametersCount = 1;
-        linear->adParameters = new AdParameters();
+        linear->adParameters = mArena->New<AdParameters>();
         LoadTag(node, linear->adParameters, &CVASTParser::LoadIgnoredTag);
     } else if (NameIs(name, nameLength, "TrackingEvents")) {
         LoadTag(node, linear, &CVASTParser::LoadTrackingEventsTag);
@@ -92,7 +89,7 @@ unsigned int CVASTParser::LoadMediaFilesTag(void* node, void* target, char* name
     if (!NameIs(name, nameLength, "MediaFile")) return KA_OK;
     AdLinear* linear = static_cast<AdLinear*>(target);
     linear->mediaFileCount++;
-    AdMediaFile* mediaFile = new AdMediaFile();
+    AdMediaFile* mediaFile = mArena->New<AdMediaFile>();
     mMediaFileTail.Append(&linear->mediaFiles, mediaFile);
     LoadMediaFileAttributes(node, mediaFile);
     GetElementText(node, mediaFile->url);
@@ -101,26 +98,30 @@ unsigned int CVASTParser::LoadMediaFilesTag(void* node, void* target, char* name
 
 unsigned int CVASTParser::LoadMediaFileAttributes(void* node, AdMediaFile* mediaFile) {
     if (node == nullptr || mediaFile == nullptr) return KA_OK;
-    char* value = nullptr;
-    int length = 0;
-    if (ReadAttribute(node, "delivery", &value, length)) {
-        unsigned int size = static_cast<unsigned int>(length);
-        if (NameIs(value, size, "progressive")) {
+    // Media files carry most of their attributes: all are read in one pass, in this order.
+    static constexpr auto kNames =
+        ka::AttributeNames("delivery", "type", "width", "height", "codec", "id", "bitrate",
+                           "minBitrate", "maxBitrate", "scalable", "maintainAspectRatio");
+    XMLAttributeValue values[11];
+    ReadAttributes(node, kNames, values);
+    if (values[0].Present()) {
+        const unsigned int size = static_cast<unsigned int>(values[0].length);
+        if (NameIs(values[0].value, size, "progressive")) {
             mediaFile->delivery = AD_DELIVERY_PROGRESSIVE;
-        } else if (NameIs(value, size, "streaming")) {
+        } else if (NameIs(values[0].value, size, "streaming")) {
             mediaFile->delivery = AD_DELIVERY_STREAMING;
         }
     }
-    CopyAttribute(node, "type", mediaFile->type);
-    ReadNumber(*this, node, "width", mediaFile->width);
-    ReadNumber(*this, node, "height", mediaFile->height);
-    CopyAttribute(node, "codec", mediaFile->codec);
-    ReadNumber(*this, node, "id", mediaFile->id);
-    ReadNumber(*this, node, "bitrate", mediaFile->bitrate);
-    ReadNumber(*this, node, "minBitrate", mediaFile->minBitrate);
-    ReadNumber(*this, node, "maxBitrate", mediaFile->maxBitrate);
-    ReadNumber(*this, node, "scalable", mediaFile->scalable);
-    ReadNumber(*this, node, "maintainAspectRatio", mediaFile->maintainAspectRatio);
+    CopyAttribute(values[1], mediaFile->type);
+    ReadNumber(values[2], mediaFile->width);
+    ReadNumber(values[3], mediaFile->height);
+    CopyAttribute(values[4], mediaFile->codec);
+    ReadNumber(values[5], mediaFile->id);
+    ReadNumber(values[6], mediaFile->bitrate);
+    ReadNumber(values[7], mediaFile->minBitrate);
+    ReadNumber(values[8], mediaFile->maxBitrate);
+    ReadNumber(values[9], mediaFile->scalable);
+    ReadNumber(values[10], mediaFile->maintainAspectRatio);
     return KA_OK;
 }
 
@@ -146,7 +147,7 @@ unsigned int CVASTParser::LoadTrackingEventsTag(void* node, void* target, char* 
     if (!NameIs(name, nameLength, "Tracking")) return KA_OK;
     AdLinear* linear = static_cast<AdLinear*>(target);
     linear->trackingCount++;
-    AdTracking* tracking = new AdTracking();
+    AdTracking* tracking = mArena->New<AdTracking>();
     mTrackingTail.Append(&linear->trackingEvents, tracking);
     LoadTrackingAttributes(node, tracking);
     GetElementText(node, tracking->url);
@@ -155,10 +156,13 @@ unsigned int CVASTParser::LoadTrackingEventsTag(void* node, void* target, char* 
 
 unsigned int CVASTParser::LoadTrackingAttributes(void* node, AdTracking* tracking) {
     if (node == nullptr || tracking == nullptr) return KA_OK;
-    CopyAttribute(node, "event", tracking->event);
-    char* value = nullptr;
-    int length = 0;
-    if (!ReadAttribute(node, "offset", &value, length)) return KA_OK;
+    static constexpr auto kNames = ka::AttributeNames("event", "offset");
+    XMLAttributeValue values[2];
+    ReadAttributes(node, kNames, values);
+    CopyAttribute(values[0], tracking->event);
+    if (!values[1].Present()) return KA_OK;
+    const char* value = values[1].value;
+    const int length = values[1].length;
     if (IsPercent(value, length)) {
         // A percentage of the duration, kept as the number written (two characters at most).
         long long percent = 0;

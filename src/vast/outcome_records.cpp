@@ -1,6 +1,6 @@
 // Chain outcome records. Each outcome is one block: the record, then its hops, then its Error
 // URL pointers, then every string they point to; one allocation per ad of the player's
-// document, and one release.
+// document.
 #include "vast/outcome_records.h"
 
 #include <cstring>
@@ -9,10 +9,6 @@
 namespace ka {
 
 namespace {
-
-// The allocation functions of these records; nothing else here allocates or frees.
-void* NewBlock(size_t bytes) { return ::operator new(bytes); }
-void FreeBlock(void* block) { ::operator delete(block); }
 
 size_t TextSize(const std::string& text) { return text.size() + 1; }
 
@@ -24,7 +20,7 @@ char* PlaceText(const std::string& text, char*& at) {
     return copy;
 }
 
-KaChainOutcome* NewOutcome(const AdTrace& ad) {
+KaChainOutcome* NewOutcome(const AdTrace& ad, Arena& records) {
     size_t bytes = sizeof(KaChainOutcome) + ad.hops.size() * sizeof(KaChainHop) +
                    ad.errorUrls.size() * sizeof(char*);
     for (const HopTrace& hop : ad.hops) {
@@ -33,7 +29,7 @@ KaChainOutcome* NewOutcome(const AdTrace& ad) {
     for (const TraceText& url : ad.errorUrls) bytes += TextSize(url.text);
 
     // Plain C records: the zeroed block holds them as a C player would allocate them.
-    char* block = static_cast<char*>(NewBlock(bytes));
+    char* block = static_cast<char*>(records.Allocate(bytes, alignof(KaChainOutcome)));
     memset(block, 0, bytes);
     KaChainOutcome* outcome = reinterpret_cast<KaChainOutcome*>(block);
     outcome->ad = ad.ad;
@@ -70,20 +66,12 @@ KaChainOutcome* NewOutcome(const AdTrace& ad) {
 
 }  // namespace
 
-void BuildChainOutcomes(const ChainTrace& trace, KaChainOutcome** head) {
+void BuildChainOutcomes(const ChainTrace& trace, Arena& records, KaChainOutcome** head) {
     KaChainOutcome** end = head;
     while (*end != nullptr) end = &(*end)->next;
     for (const AdTrace& ad : trace.Ads()) {
-        *end = NewOutcome(ad);
+        *end = NewOutcome(ad, records);
         end = &(*end)->next;
-    }
-}
-
-void ReleaseChainOutcomes(KaChainOutcome*& head) {
-    while (head != nullptr) {
-        KaChainOutcome* next = head->next;
-        FreeBlock(head);
-        head = next;
     }
 }
 

@@ -1,16 +1,14 @@
-// The public KaChainOutcome records built from a ChainTrace, and their release. Each outcome is
-// one block, allocated and freed by the two functions of outcome_records.cpp.
+// The public KaChainOutcome records built from a ChainTrace. Each outcome is one block of the
+// handle's arena, given back with the other records of the Process.
 #pragma once
 
 #include "ka/vmap_parser_ext.h"
+#include "platform/arena.h"
 #include "vast/chain_trace.h"
 
 namespace ka {
 
-// Appends one outcome per ad of trace at the end of *head, each linked in as soon as it exists:
-// when an allocation throws, ReleaseChainOutcomes frees what was built.
-void BuildChainOutcomes(const ChainTrace& trace, KaChainOutcome** head);
-// Frees the list and everything it owns; sets head to null.
-void ReleaseChainOutcomes(KaChainOutcome*& head);
+// Appends one outcome per ad of trace at the end of *head, each allocated from records.
+void BuildChainOutcomes(const ChainTrace& trace, Arena& records, KaChainOutcome** head);
 
 }  // namespace ka

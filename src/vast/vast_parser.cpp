@@ -15,7 +15,9 @@ CVASTParser::CVASTParser()
       mMergeWrappers(1),
       mStopFlag(nullptr),
       mFetchesLeft(KA_VMAP_FETCHES_PER_AD),
-      mBudget(nullptr) {}
+      mBudget(nullptr) {
+    mArena = &mOwnArena;
+}
 
 CVASTParser::~CVASTParser() { CVASTParser::Close(); }
 

@@ -50,6 +50,10 @@ public:
     // Forgets the records of mVastAdData without releasing them: whoever copied the container
     // owns them now.
     void ForgetVastAdData();
+    // Builds the records in arena, which must outlive them: the handle's arena for the handle's
+    // parser, the parent's for a nested one. A parser made on its own uses an arena of its own,
+    // freed with the parser.
+    void UseArena(ka::Arena* arena) { mArena = arena; }
 
     // Calls handler for every child element of node that has a non-empty name; always 0.
     unsigned int LoadTag(void* node, void* target, TagHandler handler);
@@ -142,6 +146,9 @@ private:
     void AppendLinearTracking(AdLinear* target, AdLinear* const* sources, size_t count);
     // Forgets the remembered list ends; called around every walk and by every release.
     void ResetTails();
+
+    // The arena of a parser that was given none.
+    ka::Arena mOwnArena;
 
     // Last nodes appended, one per kind of list being filled (record_lists.h).
     ka::ListTail<AdData> mAdTail;

@@ -1,4 +1,7 @@
-// Releases of the VAST records. Lists are freed node by node with loops, whatever their length.
+// Releases of the VAST records. The records and their strings live in the arena of the handle
+// (ka::Arena), which gives their memory back all at once; a release unlinks them in the order
+// records are released, nulls what it let go, and destroys what lives on the heap: extension
+// objects and nested parsers. Lists are walked with loops, whatever their length.
 #include "vast/vast_release.h"
 
 #include "ka/result_codes.h"
@@ -7,42 +10,7 @@
 
 namespace {
 
-void FreeString(char*& text) {
-    delete[] text;
-    text = nullptr;
-}
-
-void FreeImpressions(AdImpression*& list) {
-    while (list != nullptr) {
-        AdImpression* next = list->next;
-        delete[] list->url;
-        delete list;
-        list = next;
-    }
-}
-
-// Frees at most count nodes of a click list, stopping early at its end.
-void FreeClicks(AdClick*& list, uint32_t count) {
-    for (uint32_t i = 0; i < count && list != nullptr; ++i) {
-        AdClick* next = list->next;
-        delete[] list->id;
-        delete[] list->url;
-        delete list;
-        list = next;
-    }
-    list = nullptr;
-}
-
-// Frees at most count nodes of a list whose nodes own nothing.
-template <typename T>
-void FreePlainList(T*& list, uint32_t count) {
-    for (uint32_t i = 0; i < count && list != nullptr; ++i) {
-        T* next = list->next;
-        delete list;
-        list = next;
-    }
-    list = nullptr;
-}
+void FreeString(char*& text) { text = nullptr; }
 
 void FreeExtensions(CAdExtensions*& extensions) {
     delete extensions;
@@ -56,7 +24,6 @@ void FreeCreatives(AdCreative*& list) {
         FreeString(list->id);
         FreeString(list->adId);
         if (list->kind == AD_CREATIVE_LINEAR) ka::ReleaseLinear(&list->content);
-        delete list;
         list = next;
     }
 }
@@ -72,7 +39,6 @@ unsigned int ReleaseVastAdData(VastAdData* data) {
     while (ad != nullptr) {
         AdData* next = ad->next;
         ReleaseAdData(ad);
-        delete ad;
         ad = next;
     }
     data->firstAd = nullptr;
@@ -87,7 +53,7 @@ unsigned int ReleaseAdData(AdData* ad) {
         FreeString(wrapper->vastAdTagUri);
         FreeString(wrapper->adSystem);
         FreeString(wrapper->error);
-        FreeImpressions(wrapper->impressions);
+        wrapper->impressions = nullptr;  // nodes and URLs are the arena's
         FreeCreatives(wrapper->creatives);
         FreeExtensions(wrapper->extensions);
         if (wrapper->nestedParser != nullptr) {
@@ -97,19 +63,17 @@ unsigned int ReleaseAdData(AdData* ad) {
             ReleaseVastAdData(&nested->mVastAdData);
             delete nested;
         }
-        delete wrapper;
     } else if (ad->type == AD_TYPE_INLINE && ad->body != nullptr) {
         AdInLine* inLine = static_cast<AdInLine*>(ad->body);
         FreeString(inLine->adSystem);
         FreeString(inLine->adTitle);
-        FreeImpressions(inLine->impressions);
+        inLine->impressions = nullptr;
         FreeString(inLine->description);
         FreeString(inLine->advertiser);
         FreeString(inLine->survey);
         FreeString(inLine->error);
         FreeCreatives(inLine->creatives);
         FreeExtensions(inLine->extensions);
-        delete inLine;
     }
     ad->body = nullptr;
     FreeString(ad->id);
@@ -118,32 +82,7 @@ unsigned int ReleaseAdData(AdData* ad) {
 
 unsigned int ReleaseLinear(AdLinear* linear) {
     if (linear == nullptr) return KA_OK;
-    AdMediaFile* mediaFile = linear->mediaFiles;
-    for (uint32_t i = 0; i < linear->mediaFileCount && mediaFile != nullptr; ++i) {
-        AdMediaFile* next = mediaFile->next;
-        delete[] mediaFile->type;
-        delete[] mediaFile->codec;
-        delete[] mediaFile->url;
-        delete mediaFile;
-        mediaFile = next;
-    }
-    if (linear->videoClicks != nullptr && linear->videoClicksCount != 0) {
-        AdVideoClicks* clicks = linear->videoClicks;
-        FreeClicks(clicks->clickThroughs, clicks->clickThroughCount);
-        FreeClicks(clicks->clickTrackings, clicks->clickTrackingCount);
-        FreeClicks(clicks->customClicks, clicks->customClickCount);
-        delete clicks;
-    }
-    FreePlainList(linear->adParameters, linear->adParametersCount);
-    AdTracking* tracking = linear->trackingEvents;
-    for (uint32_t i = 0; i < linear->trackingCount && tracking != nullptr; ++i) {
-        AdTracking* next = tracking->next;
-        delete[] tracking->event;
-        delete[] tracking->url;
-        delete tracking;
-        tracking = next;
-    }
-    FreePlainList(linear->icons, linear->iconCount);
+    // Nothing below a linear creative lives on the heap: its lists go with the arena.
     *linear = AdLinear();
     return KA_OK;
 }

@@ -96,6 +96,8 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
 
     CVASTParser* nested = new CVASTParser();
     wrapper->nestedParser = nested;
+    // Its records join this parser's: the merge moves them into this document's list.
+    nested->UseArena(mArena);
     nested->SetWorkPath(chain.workPath);
     // A failed load shows up as a failed Process below.
     nested->InitXMLParser();
@@ -256,17 +258,17 @@ void CVASTParser::CopyImpressionList(const AdImpression* list, ka::ListEnd<AdImp
                                      uint32_t& count) {
     for (; list != nullptr; list = list->next) {
         if (!TakeCopy(sizeof(AdImpression), list->url)) break;
-        AdImpression* copy = ka::Link(end, new AdImpression(), count);
-        copy->url = ka::CopyString(list->url);
+        AdImpression* copy = ka::Link(end, mArena->New<AdImpression>(), count);
+        copy->url = mArena->CopyString(list->url);
     }
 }
 
 void CVASTParser::CopyClickList(const AdClick* list, ka::ListEnd<AdClick>& end, uint32_t& count) {
     for (; list != nullptr; list = list->next) {
         if (!TakeCopy(sizeof(AdClick) + ka::CopySize(list->id), list->url)) break;
-        AdClick* copy = ka::Link(end, new AdClick(), count);
-        copy->id = ka::CopyString(list->id);
-        copy->url = ka::CopyString(list->url);
+        AdClick* copy = ka::Link(end, mArena->New<AdClick>(), count);
+        copy->id = mArena->CopyString(list->id);
+        copy->url = mArena->CopyString(list->url);
     }
 }
 
@@ -274,11 +276,11 @@ void CVASTParser::CopyTrackingList(const AdTracking* list, ka::ListEnd<AdTrackin
                                    uint32_t& count) {
     for (; list != nullptr; list = list->next) {
         if (!TakeCopy(sizeof(AdTracking) + ka::CopySize(list->event), list->url)) break;
-        AdTracking* copy = ka::Link(end, new AdTracking(), count);
-        copy->event = ka::CopyString(list->event);
+        AdTracking* copy = ka::Link(end, mArena->New<AdTracking>(), count);
+        copy->event = mArena->CopyString(list->event);
         copy->offsetKind = list->offsetKind;
         copy->offset = list->offset;
-        copy->url = ka::CopyString(list->url);
+        copy->url = mArena->CopyString(list->url);
     }
 }
 

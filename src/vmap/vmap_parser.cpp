@@ -33,9 +33,12 @@ CVMAPParser::CVMAPParser()
       mInlineChain(ka::ChainContext::Start(1, nullptr, nullptr, &mBudget, nullptr)),
       mTrace(),
       mOutcomes(nullptr),
+      mRecords(),
       mBreakTail(),
       mTrackingTail(),
-      mBuiltVastOnly(0) {}
+      mBuiltVastOnly(0) {
+    mArena = &mRecords;
+}
 
 CVMAPParser::~CVMAPParser() {
     ReleaseAll();
@@ -59,12 +62,13 @@ unsigned int CVMAPParser::Reset() {
 }
 
 void CVMAPParser::ReleaseAll() {
-    delete[] mContentUri;
     mContentUri = nullptr;
     ReleaseAdInfo();
     DestroyVASTParser();
-    ka::ReleaseChainOutcomes(mOutcomes);
+    mOutcomes = nullptr;
     mTrace.Clear();
+    // Nothing points into the arena any more.
+    mRecords.Reset();
 }
 
 unsigned int CVMAPParser::Process(void* buffer, unsigned int size) {
@@ -104,7 +108,7 @@ unsigned int CVMAPParser::Process(void* buffer, unsigned int size) {
 }
 
 void CVMAPParser::PublishOutcomes() {
-    ka::BuildChainOutcomes(mTrace, &mOutcomes);
+    ka::BuildChainOutcomes(mTrace, mRecords, &mOutcomes);
     mTrace.Clear();
 }
 
@@ -194,25 +198,16 @@ unsigned int CVMAPParser::ReleaseAdInfo() {
     // a list that exists belongs to an earlier VMAP Process and is freed exactly once here.
     AdBreak* adBreak = mAdInfo.adBreaks;
     for (uint32_t i = 0; i < mAdInfo.adBreakCount && adBreak != nullptr; ++i) {
+        // The records and their strings are the arena's; only the VAST records below a source
+        // may hold objects of the heap.
         if (AdSource* source = adBreak->adSource) {
             ReleaseVastBlock(source->vastAdData);
             source->vastAdData = nullptr;
-            delete[] source->adTagUri;
-            delete[] source->reservedText;
-            delete source;
+            adBreak->adSource = nullptr;
         }
-        AdBreakTracking* tracking = adBreak->trackings;
-        while (tracking != nullptr) {
-            AdBreakTracking* next = tracking->next;
-            delete[] tracking->event;
-            delete[] tracking->url;
-            delete tracking;
-            tracking = next;
-        }
-        delete[] adBreak->breakId;
-        AdBreak* next = adBreak->next;
-        delete adBreak;
-        adBreak = next;
+        adBreak->trackings = nullptr;
+        adBreak->breakId = nullptr;
+        adBreak = adBreak->next;
     }
     mAdInfo.adBreakCount = 0;
     mAdInfo.adBreaks = nullptr;
@@ -224,7 +219,6 @@ unsigned int CVMAPParser::ReleaseAdInfo() {
 void CVMAPParser::ReleaseVastBlock(VastAdData* block) {
     if (block == nullptr) return;
     ka::ReleaseVastAdData(block);
-    delete block;
 }
 
 void CVMAPParser::CreateVASTParser() {
@@ -232,7 +226,11 @@ void CVMAPParser::CreateVASTParser() {
     // with whoever copied them.
     DestroyVASTParser();
     mVastParser = new CVASTParser();
-    mVastParser->Open(mWorkPath);
+    mVastParser->SetWorkPath(mWorkPath);
+    mVastParser->UseArena(&mRecords);
+    // The document it reads is this handle's or goes through this handle's module, which stays
+    // loaded from Open to Close.
+    mVastParser->BorrowXMLParser(*this);
 }
 
 void CVMAPParser::DestroyVASTParser() {
@@ -295,7 +293,7 @@ unsigned int CVMAPParser::LoadVMAPTag(void* node, void* target, char* name, unsi
         ReadContentUri(node);
     } else if (ka::NameIs(name, length, "vmap:AdBreak")) {
         ++info->adBreakCount;
-        AdBreak* adBreak = new AdBreak();
+        AdBreak* adBreak = mRecords.New<AdBreak>();
         mBreakTail.Append(&mAdInfo.adBreaks, adBreak);
         ParseAdBreakAttributes(node, adBreak);
         LoadTag(node, adBreak, &CVMAPParser::LoadAdBreakTag);
@@ -312,17 +310,20 @@ void CVMAPParser::ReadContentUri(void* extensions) {
 
 unsigned int CVMAPParser::ParseAdBreakAttributes(void* node, AdBreak* adBreak) {
     if (node == nullptr || adBreak == nullptr) return KA_OK;
-    char* value = nullptr;
-    int length = 0;
-    if (ReadAttribute(node, "breakType", &value, length)) {
-        adBreak->breakType |= ka::ParseBreakType(value, length);
+    static constexpr auto kNames =
+        ka::AttributeNames("breakType", "breakId", "timeOffset", "repeatAfter");
+    XMLAttributeValue values[4];
+    ReadAttributes(node, kNames, values);
+    if (values[0].Present()) {
+        adBreak->breakType |= ka::ParseBreakType(values[0].value, values[0].length);
     }
-    CopyAttribute(node, "breakId", adBreak->breakId);
-    if (ReadAttribute(node, "timeOffset", &value, length)) {
-        ka::ParseTimeOffset(value, length, &adBreak->timeOffsetType, &adBreak->timeOffset);
+    CopyAttribute(values[1], adBreak->breakId);
+    if (values[2].Present()) {
+        ka::ParseTimeOffset(values[2].value, values[2].length, &adBreak->timeOffsetType,
+                            &adBreak->timeOffset);
     }
-    if (ReadAttribute(node, "repeatAfter", &value, length)) {
-        adBreak->repeatAfter = ka::ParseRepeatAfter(value, length);
+    if (values[3].Present()) {
+        adBreak->repeatAfter = ka::ParseRepeatAfter(values[3].value, values[3].length);
     }
     return KA_OK;
 }
@@ -334,7 +335,7 @@ unsigned int CVMAPParser::LoadAdBreakTag(void* node, void* target, char* name,
     if (ka::NameIs(name, length, "vmap:AdSource")) {
         // The first source wins; a later one is skipped whole.
         if (adBreak->adSource != nullptr) return KA_OK;
-        adBreak->adSource = new AdSource();
+        adBreak->adSource = mRecords.New<AdSource>();
         ParseAdSourceAttributes(node, adBreak->adSource);
         LoadTag(node, adBreak->adSource, &CVMAPParser::LoadAdSourceTag);
         SumLinearDuration(adBreak);
@@ -346,15 +347,12 @@ unsigned int CVMAPParser::LoadAdBreakTag(void* node, void* target, char* name,
 
 unsigned int CVMAPParser::ParseAdSourceAttributes(void* node, AdSource* source) {
     if (node == nullptr || source == nullptr) return KA_OK;
-    char* value = nullptr;
-    int length = 0;
-    if (ReadAttribute(node, "id", &value, length)) source->id = ka::ParseDecimal(value);
-    if (ReadAttribute(node, "allowMultipleAds", &value, length)) {
-        source->allowMultipleAds = strcmp(value, "true") == 0;
-    }
-    if (ReadAttribute(node, "followRedirects", &value, length)) {
-        source->followRedirects = strcmp(value, "true") == 0;
-    }
+    static constexpr auto kNames = ka::AttributeNames("id", "allowMultipleAds", "followRedirects");
+    XMLAttributeValue values[3];
+    ReadAttributes(node, kNames, values);
+    if (values[0].Present()) source->id = ka::ParseDecimal(values[0].value);
+    if (values[1].Present()) source->allowMultipleAds = strcmp(values[1].value, "true") == 0;
+    if (values[2].Present()) source->followRedirects = strcmp(values[2].value, "true") == 0;
     return KA_OK;
 }
 
@@ -369,7 +367,7 @@ unsigned int CVMAPParser::LoadAdSourceTag(void* node, void* target, char* name,
                ka::NameIs(name, length, "vmap:VASTData")) {
         // Only the first of either is read.
         if (source->vastAdData != nullptr) return KA_OK;
-        source->vastAdData = new VastAdData();
+        source->vastAdData = mRecords.New<VastAdData>();
         LoadVASTAdData(node, source->vastAdData);
     }
     return KA_OK;
@@ -380,7 +378,7 @@ unsigned int CVMAPParser::LoadTrackingTag(void* node, void* target, char* name,
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
     if (!ka::NameIs(name, length, "vmap:Tracking")) return KA_OK;
     AdBreak* adBreak = static_cast<AdBreak*>(target);
-    AdBreakTracking* tracking = new AdBreakTracking();
+    AdBreakTracking* tracking = mRecords.New<AdBreakTracking>();
     mTrackingTail.Append(&adBreak->trackings, tracking);
     ParseTrackingEvent(node, tracking);
     GetElementText(node, tracking->url);

@@ -51,8 +51,9 @@ public:
     // Frees the records of the last Process, leaving an empty AdInfo; always 0.
     unsigned int ReleaseAdInfo();
 
-    // The owned VAST parser: created and opened on the working path (Open's result is not
-    // looked at), and closed and destroyed. Destroying it does not release its container.
+    // The owned VAST parser: created on the working path, building its records in this
+    // handle's arena and reading through this handle's XML module (nothing is loaded per
+    // Process), and closed and destroyed. Destroying it does not release its container.
     void CreateVASTParser();
     void DestroyVASTParser();
     // Reads the VAST child of a vmap:VASTAdData / vmap:VASTData element into block, which then
@@ -98,6 +99,9 @@ private:
     // What the chains of the running Process did, and the records made of it when it ended.
     ka::ChainTrace mTrace;
     KaChainOutcome* mOutcomes;
+    // Every record and string of the last Process, the VAST parsers' included; given back at
+    // once when they are released.
+    ka::Arena mRecords;
     // The last records appended, so that long lists are filled in linear time.
     ka::ListTail<AdBreak> mBreakTail;
     ka::ListTail<AdBreakTracking> mTrackingTail;

@@ -1,6 +1,7 @@
 #include "xml/text.h"
 
 #include <climits>
+#include <cstdint>
 #include <cstring>
 
 #include "ka/result_codes.h"
@@ -14,33 +15,11 @@ constexpr size_t kAmpEntityLength = sizeof(kAmpEntity) - 1;
 // Past this a decimal magnitude stops growing: it already clamps to either end of int.
 constexpr long long kDecimalCeiling = static_cast<long long>(INT_MAX) + 1;
 
-}  // namespace
-
-namespace ka {
-
-bool IsCDataSection(const char* text) {
-    return text[0] == kXmlCDataOpen[0] && strncmp(text, kXmlCDataOpen, kXmlCDataOpenLength) == 0;
-}
-
-bool CDataContent(const char* text, size_t length, size_t* begin, size_t* count) {
-    // The opening ends in '[' and the closing holds none, so the two never overlap.
-    if (length < kXmlCDataOpenLength + kXmlCDataCloseLength ||
-        memcmp(text, kXmlCDataOpen, kXmlCDataOpenLength) != 0 ||
-        memcmp(text + length - kXmlCDataCloseLength, kXmlCDataClose, kXmlCDataCloseLength) != 0) {
-        return false;
-    }
-    size_t first = kXmlCDataOpenLength;
-    size_t end = length - kXmlCDataCloseLength;
-    while (first < end && IsSpace(text[first])) ++first;
-    while (end > first && IsSpace(text[end - 1])) --end;
-    *begin = first;
-    *count = end - first;
-    return true;
-}
-
-bool ScanDecimal(const char** cursor, int width, long long* value) {
+// ScanDecimal's reading, inlined where string2time reads its four fields.
+__attribute__((always_inline)) inline bool ScanDecimalInline(const char** cursor, int width,
+                                                             long long* value) {
     const char* p = *cursor;
-    while (IsSpace(*p)) ++p;
+    while (ka::IsSpace(*p)) ++p;
     int left = width;
     bool negative = false;
     if (*p == '+' || *p == '-') {
@@ -63,6 +42,30 @@ bool ScanDecimal(const char** cursor, int width, long long* value) {
     return true;
 }
 
+}  // namespace
+
+namespace ka {
+
+bool CDataContent(const char* text, size_t length, size_t* begin, size_t* count) {
+    // The opening ends in '[' and the closing holds none, so the two never overlap.
+    if (length < kXmlCDataOpenLength + kXmlCDataCloseLength ||
+        memcmp(text, kXmlCDataOpen, kXmlCDataOpenLength) != 0 ||
+        memcmp(text + length - kXmlCDataCloseLength, kXmlCDataClose, kXmlCDataCloseLength) != 0) {
+        return false;
+    }
+    size_t first = kXmlCDataOpenLength;
+    size_t end = length - kXmlCDataCloseLength;
+    while (first < end && IsSpace(text[first])) ++first;
+    while (end > first && IsSpace(text[end - 1])) --end;
+    *begin = first;
+    *count = end - first;
+    return true;
+}
+
+bool ScanDecimal(const char** cursor, int width, long long* value) {
+    return ScanDecimalInline(cursor, width, value);
+}
+
 int ParseDecimal(const char* text) {
     if (text == nullptr) return 0;
     long long value = 0;
@@ -72,15 +75,49 @@ int ParseDecimal(const char* text) {
     return static_cast<int>(value);
 }
 
-char* CopyText(const char* text, size_t length) {
-    char* copy = new char[length + 1];
-    memcpy(copy, text, length);
-    copy[length] = '\0';
-    return copy;
+int Atoi(const char* text) {
+    const char* p = text;
+    while (IsSpace(*p)) ++p;
+    bool negative = false;
+    if (*p == '+' || *p == '-') {
+        negative = *p == '-';
+        ++p;
+    }
+    // strtol stops growing the magnitude at the end of the long range and answers that end.
+    const unsigned long limit = negative ? static_cast<unsigned long>(LONG_MAX) + 1 : LONG_MAX;
+    // Below this, another digit cannot pass the limit: the common case needs no test.
+    constexpr unsigned long kSafe = LONG_MAX / 10 - 1;
+    unsigned long magnitude = 0;
+    for (; *p >= '0' && *p <= '9'; ++p) {
+        const unsigned long digit = static_cast<unsigned long>(*p - '0');
+        if (magnitude < kSafe) {
+            magnitude = magnitude * 10 + digit;
+        } else {
+            magnitude = magnitude > (limit - digit) / 10 ? limit : magnitude * 10 + digit;
+        }
+    }
+    const unsigned long bits = negative ? 0 - magnitude : magnitude;
+    // The low 32 bits as a signed int: what converting strtol's long to int gives.
+    return static_cast<int>(static_cast<uint32_t>(bits));
 }
 
-char* CopyString(const char* text) {
-    return text == nullptr ? nullptr : CopyText(text, strlen(text));
+size_t CopyDecodingAmp(char* out, const char* text, size_t length) {
+    char* write = out;
+    const char* read = text;
+    const char* end = text + length;
+    // Between two '&' everything moves as one block; most texts hold none.
+    while (const char* amp = static_cast<const char*>(memchr(read, '&', end - read))) {
+        memcpy(write, read, amp - read);
+        write += amp - read;
+        *write++ = '&';
+        const bool entity = static_cast<size_t>(end - amp) >= kAmpEntityLength &&
+                            memcmp(amp, kAmpEntity, kAmpEntityLength) == 0;
+        read = amp + (entity ? kAmpEntityLength : 1);
+    }
+    memcpy(write, read, end - read);
+    write += end - read;
+    *write = '\0';
+    return static_cast<size_t>(write - out);
 }
 
 }  // namespace ka
@@ -139,7 +176,7 @@ unsigned int string2time(const char* text, int length) {
     const char separators[4] = {':', ':', '.', '\0'};
     const char* cursor = text;
     for (int i = 0; i < 4; ++i) {
-        if (!ka::ScanDecimal(&cursor, widths[i], &fields[i])) break;
+        if (!ScanDecimalInline(&cursor, widths[i], &fields[i])) break;
         if (separators[i] == '\0' || *cursor != separators[i]) break;
         ++cursor;
     }

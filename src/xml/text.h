@@ -31,8 +31,11 @@ inline bool NameIs(const char* name, unsigned int length, const char* literal) {
     return length == n && memcmp(name, literal, n) == 0;
 }
 
-// True when text begins with the "![CDATA[" opening, whether or not the section closes.
-bool IsCDataSection(const char* text);
+// True when text begins with the "![CDATA[" opening, whether or not the section closes. Inline:
+// every element text is tested, and most fail at the first character.
+inline bool IsCDataSection(const char* text) {
+    return text[0] == kXmlCDataOpen[0] && strncmp(text, kXmlCDataOpen, kXmlCDataOpenLength) == 0;
+}
 // Where the trimmed content of a complete raw "![CDATA[...]]" section of length bytes begins and
 // how long it is; false (outputs untouched) when text is not such a section.
 bool CDataContent(const char* text, size_t length, size_t* begin, size_t* count);
@@ -44,14 +47,14 @@ bool ScanDecimal(const char** cursor, int width, long long* value);
 // atoi's reading (leading white space, a sign, digits up to the first other character, 0
 // without digits), clamped to the int range instead of overflowing.
 int ParseDecimal(const char* text);
+// What atoi gives, without the locale machinery of strtol: the number read as strtol reads it
+// into a long (clamped to the long range), then taken as an int (its low 32 bits).
+int Atoi(const char* text);
 
-// A new[] copy of the first length characters of text, terminated. Like every allocation of
-// the parsers, throws std::bad_alloc when memory runs out; the public table turns that into
-// KA_ERR_NO_MEMORY.
-char* CopyText(const char* text, size_t length);
-// A new[] copy of a terminated string; null for null.
-char* CopyString(const char* text);
-// The bytes CopyString allocates for text; 0 for null.
+// Copies the first length characters of text into out (room for length + 1), turning every
+// "&amp;" into "&" as unescape_amp does, and terminates it; the length written.
+size_t CopyDecodingAmp(char* out, const char* text, size_t length);
+// The bytes a copy of text takes (ka::Arena::CopyString); 0 for null.
 inline size_t CopySize(const char* text) { return text == nullptr ? 0 : strlen(text) + 1; }
 
 }  // namespace ka

@@ -12,9 +12,38 @@ constexpr char kModuleName[] = "kaXMLParser";
 constexpr char kModuleExtension[] = ".so";
 constexpr char kEntryName[] = "kaXMLGetParserAPI";
 
+// Handlers that read at most this many attributes look each one up by name.
+constexpr size_t kLookedUpNames = 2;
+
+template <typename Word>
+Word Load(const char* at) {
+    Word word;
+    memcpy(&word, at, sizeof(word));
+    return word;
+}
+
+// Whether length (1 to 31) bytes at a and b are the same. Attribute names are short: a few word
+// comparisons, the last one overlapping, cost less than a call to memcmp or a byte loop, and
+// read nothing past the length.
+bool SameBytes(const char* a, const char* b, int length) {
+    if (length >= 8) {
+        for (int i = 0; i + 8 < length; i += 8) {
+            if (Load<uint64_t>(a + i) != Load<uint64_t>(b + i)) return false;
+        }
+        return Load<uint64_t>(a + length - 8) == Load<uint64_t>(b + length - 8);
+    }
+    if (length >= 4) {
+        return Load<uint32_t>(a) == Load<uint32_t>(b) &&
+               Load<uint32_t>(a + length - 4) == Load<uint32_t>(b + length - 4);
+    }
+    return a[0] == b[0] && a[length / 2] == b[length / 2] && a[length - 1] == b[length - 1];
+}
+
 }  // namespace
 
-CXMLDocument::CXMLDocument() : mXMLHandle(nullptr) { memset(&mXMLAPI, 0, sizeof(mXMLAPI)); }
+CXMLDocument::CXMLDocument() : mXMLHandle(nullptr), mArena(nullptr), mBorrowedXML(false) {
+    memset(&mXMLAPI, 0, sizeof(mXMLAPI));
+}
 
 CXMLDocument::~CXMLDocument() { UninitXMLParser(); }
 
@@ -37,6 +66,13 @@ unsigned int CXMLDocument::InitXMLParser() {
 }
 
 unsigned int CXMLDocument::UninitXMLParser() {
+    if (mBorrowedXML) {
+        // The owner closes its handle and releases its module itself.
+        mBorrowedXML = false;
+        mXMLHandle = nullptr;
+        memset(&mXMLAPI, 0, sizeof(mXMLAPI));
+        return KA_OK;
+    }
     if (mXMLAPI.Uninit != nullptr) {
         mXMLAPI.Uninit(mXMLHandle);
         mXMLHandle = nullptr;
@@ -46,49 +82,22 @@ unsigned int CXMLDocument::UninitXMLParser() {
     return KA_OK;
 }
 
+void CXMLDocument::BorrowXMLParser(const CXMLDocument& owner) {
+    UninitXMLParser();
+    mXMLHandle = owner.mXMLHandle;
+    mXMLAPI = owner.mXMLAPI;
+    mBorrowedXML = true;
+}
+
 // Forwarders. A module that left a slot empty answers like a missing module instead of crashing.
 unsigned int CXMLDocument::LoadXML(char* buffer, int size, int mode) {
     if (mXMLHandle == nullptr || mXMLAPI.LoadXML == nullptr) return KA_ERR_MODULE_NOT_LOADED;
     return mXMLAPI.LoadXML(mXMLHandle, buffer, size, mode);
 }
 
-unsigned int CXMLDocument::GetFirstChild(void* node, void** child) {
-    if (mXMLHandle == nullptr || mXMLAPI.GetFirstChild == nullptr) return KA_ERR_MODULE_NOT_LOADED;
-    return mXMLAPI.GetFirstChild(mXMLHandle, node, child);
-}
-
-unsigned int CXMLDocument::GetNextSibling(void* node, void** sibling) {
-    if (mXMLHandle == nullptr || mXMLAPI.GetNextSibling == nullptr) return KA_ERR_MODULE_NOT_LOADED;
-    return mXMLAPI.GetNextSibling(mXMLHandle, node, sibling);
-}
-
 unsigned int CXMLDocument::GetChildByName(void* node, char* name, void** child) {
     if (mXMLHandle == nullptr || mXMLAPI.GetChildByName == nullptr) return KA_ERR_MODULE_NOT_LOADED;
     return mXMLAPI.GetChildByName(mXMLHandle, node, name, child);
-}
-
-unsigned int CXMLDocument::GetAttributeValue(void* node, char* name, char** value, int& length) {
-    if (mXMLHandle == nullptr || mXMLAPI.GetAttributeValue == nullptr)
-        return KA_ERR_MODULE_NOT_LOADED;
-    return mXMLAPI.GetAttributeValue(mXMLHandle, node, name, value, &length);
-}
-
-unsigned int CXMLDocument::GetNextAttribute(void* node, void** next, void* current, char** name,
-                                            int& nameLength, char** value, int& valueLength) {
-    if (mXMLHandle == nullptr || mXMLAPI.GetNextAttribute == nullptr)
-        return KA_ERR_MODULE_NOT_LOADED;
-    return mXMLAPI.GetNextAttribute(mXMLHandle, node, next, current, name, &nameLength, value,
-                                    &valueLength);
-}
-
-unsigned int CXMLDocument::GetTagValue(void* node, char** text, int& length) {
-    if (mXMLHandle == nullptr || mXMLAPI.GetTagValue == nullptr) return KA_ERR_MODULE_NOT_LOADED;
-    return mXMLAPI.GetTagValue(mXMLHandle, node, text, &length);
-}
-
-unsigned int CXMLDocument::GetTagName(void* node, char** name, int& length) {
-    if (mXMLHandle == nullptr || mXMLAPI.GetTagName == nullptr) return KA_ERR_MODULE_NOT_LOADED;
-    return mXMLAPI.GetTagName(mXMLHandle, node, name, &length);
 }
 
 unsigned int CXMLDocument::SetParam(unsigned int id, void* value) {
@@ -121,14 +130,15 @@ bool CXMLDocument::ReadElementText(void* node, char*& field, TextForm form) {
     size_t begin = 0;
     size_t count = size;
     if (isCData) ka::CDataContent(text, size, &begin, &count);
-    // The copy is made before the old string goes: a copy that fails leaves the field as it
-    // was, and the failure goes up to the public table instead of a text silently missing.
-    char* copy = ka::CopyText(text + begin, count);
-    delete[] field;
-    field = copy;
-    // Most texts hold no '&' at all; they are not searched for "&amp;" a second time.
-    if (!isCData && form == TextForm::kDecoded && memchr(copy, '&', count) != nullptr) {
-        unescape_amp(field);
+    // The field changes only once the copy exists: a copy that fails leaves it as it was, and
+    // the failure goes up to the public table instead of a text silently missing. "&amp;" is
+    // decoded while copying.
+    if (!isCData && form == TextForm::kDecoded) {
+        char* copy = mArena->AllocateText(count);
+        ka::CopyDecodingAmp(copy, text + begin, count);
+        field = copy;
+    } else {
+        field = mArena->CopyText(text + begin, count);
     }
     return true;
 }
@@ -154,12 +164,58 @@ bool CXMLDocument::ReadAttribute(void* node, const char* name, char** value, int
 }
 
 bool CXMLDocument::CopyAttribute(void* node, const char* name, char*& field) {
-    char* value = nullptr;
-    int length = 0;
-    if (!ReadAttribute(node, name, &value, length)) return false;
-    // Copied first: a failed copy leaves the field as it was, never pointing at freed memory.
-    char* copy = ka::CopyText(value, static_cast<size_t>(length));
-    delete[] field;
-    field = copy;
+    XMLAttributeValue attribute;
+    if (!ReadAttribute(node, name, &attribute.value, attribute.length)) return false;
+    return CopyAttribute(attribute, field);
+}
+
+bool CXMLDocument::CopyAttribute(const XMLAttributeValue& value, char*& field) {
+    if (!value.Present()) return false;
+    field = mArena->CopyText(value.value, static_cast<size_t>(value.length));
     return true;
+}
+
+void CXMLDocument::ReadAttributeList(void* node, const XMLAttributeName* names,
+                                     const uint32_t* byLength, XMLAttributeValue* values,
+                                     size_t count) {
+    const auto nextAttribute = mXMLAPI.GetNextAttribute;
+    // Two names cost two lookups, no more calls than a pass over an element that has one of
+    // them, and no comparisons here.
+    if (count > kLookedUpNames && mXMLHandle != nullptr && nextAttribute != nullptr) {
+        // Which names have been met: the first attribute of a name is the one read, and the
+        // walk ends once every name has been met.
+        const uint32_t all = count == 32 ? ~0u : (1u << count) - 1;
+        uint32_t seen = 0;
+        void* current = nullptr;
+        while (seen != all) {
+            void* next = nullptr;
+            char* name = nullptr;
+            char* value = nullptr;
+            int nameLength = 0;
+            int valueLength = 0;
+            const unsigned int result = nextAttribute(mXMLHandle, node, &next, current, &name,
+                                                      &nameLength, &value, &valueLength);
+            if (result != KA_OK && current == nullptr) break;  // no walk: looked up by name
+            if (result != KA_OK || next == nullptr) return;
+            current = next;
+            if (name == nullptr || nameLength < 1 || nameLength >= kXMLAttributeNameLimit) continue;
+            // Only the names of this length, mostly one or none.
+            for (uint32_t candidates = byLength[nameLength]; candidates != 0;
+                 candidates &= candidates - 1) {
+                const int i = __builtin_ctz(candidates);
+                if (!SameBytes(names[i].name, name, nameLength)) continue;
+                if ((seen & (1u << i)) == 0) {
+                    seen |= 1u << i;
+                    values[i].value = value;
+                    values[i].length = valueLength;
+                }
+                break;
+            }
+        }
+        if (seen == all) return;
+    }
+    for (size_t i = 0; i < count; ++i) {
+        GetAttributeValue(node, const_cast<char*>(names[i].name), &values[i].value,
+                          values[i].length);
+    }
 }

@@ -1,9 +1,16 @@
 // CXMLDocument drives the platform's XML parser module: it loads the module through the
 // CLibLoader it is, opens one parser handle, and forwards every operation to the module's table.
-// Both parsers are documents, so each holds its own module handle.
+// Both parsers are documents, so each holds a module handle: its own, or, for the VAST parser a
+// handle makes for one Process, the handle's own, borrowed.
 #pragma once
 
+#include <cstddef>
+#include <cstdint>
+
+#include "ka/result_codes.h"
+#include "platform/arena.h"
 #include "platform/lib_loader.h"
+#include "xml/xml_attributes.h"
 #include "xml_parser_api.h"
 
 class CXMLDocument : public CLibLoader {
@@ -13,19 +20,48 @@ public:
 
     // Loads the module and opens a handle: Init's result, or 0x90000001 without a module.
     unsigned int InitXMLParser();
-    // Closes the handle, empties the table and releases the module; always 0.
+    // Closes the handle, empties the table and releases the module; always 0. A borrowed
+    // handle is only let go: its owner closes it.
     unsigned int UninitXMLParser();
+    // Uses the handle and table of owner, which must stay open while this object uses them:
+    // a parser made for one Process of its owner's needs no module of its own.
+    void BorrowXMLParser(const CXMLDocument& owner);
 
-    // Forwarders: 0x90000001 with outputs untouched while no handle is open.
-    unsigned int LoadXML(char* buffer, int size, int mode);
-    unsigned int GetFirstChild(void* node, void** child);
-    unsigned int GetNextSibling(void* node, void** sibling);
-    unsigned int GetChildByName(void* node, char* name, void** child);
-    unsigned int GetAttributeValue(void* node, char* name, char** value, int& length);
+    // Forwarders: 0x90000001 with outputs untouched while no handle is open. The walks call the
+    // first ones for every element, so they are inline.
+    unsigned int GetFirstChild(void* node, void** child) {
+        if (mXMLHandle == nullptr || mXMLAPI.GetFirstChild == nullptr)
+            return KA_ERR_MODULE_NOT_LOADED;
+        return mXMLAPI.GetFirstChild(mXMLHandle, node, child);
+    }
+    unsigned int GetNextSibling(void* node, void** sibling) {
+        if (mXMLHandle == nullptr || mXMLAPI.GetNextSibling == nullptr)
+            return KA_ERR_MODULE_NOT_LOADED;
+        return mXMLAPI.GetNextSibling(mXMLHandle, node, sibling);
+    }
+    unsigned int GetTagName(void* node, char** name, int& length) {
+        if (mXMLHandle == nullptr || mXMLAPI.GetTagName == nullptr) return KA_ERR_MODULE_NOT_LOADED;
+        return mXMLAPI.GetTagName(mXMLHandle, node, name, &length);
+    }
+    unsigned int GetTagValue(void* node, char** text, int& length) {
+        if (mXMLHandle == nullptr || mXMLAPI.GetTagValue == nullptr)
+            return KA_ERR_MODULE_NOT_LOADED;
+        return mXMLAPI.GetTagValue(mXMLHandle, node, text, &length);
+    }
+    unsigned int GetAttributeValue(void* node, char* name, char** value, int& length) {
+        if (mXMLHandle == nullptr || mXMLAPI.GetAttributeValue == nullptr)
+            return KA_ERR_MODULE_NOT_LOADED;
+        return mXMLAPI.GetAttributeValue(mXMLHandle, node, name, value, &length);
+    }
     unsigned int GetNextAttribute(void* node, void** next, void* current, char** name,
-                                  int& nameLength, char** value, int& valueLength);
-    unsigned int GetTagValue(void* node, char** text, int& length);
-    unsigned int GetTagName(void* node, char** name, int& length);
+                                  int& nameLength, char** value, int& valueLength) {
+        if (mXMLHandle == nullptr || mXMLAPI.GetNextAttribute == nullptr)
+            return KA_ERR_MODULE_NOT_LOADED;
+        return mXMLAPI.GetNextAttribute(mXMLHandle, node, next, current, name, &nameLength, value,
+                                        &valueLength);
+    }
+    unsigned int LoadXML(char* buffer, int size, int mode);
+    unsigned int GetChildByName(void* node, char* name, void** child);
     unsigned int SetParam(unsigned int id, void* value);
     unsigned int GetParam(unsigned int id, void* value);
     unsigned int Reserved12(char* text, void* node, int& a, int& b);
@@ -38,8 +74,9 @@ public:
 
     // Element text for a record field: a complete CDATA section unwrapped and trimmed (its
     // content is never decoded; one that does not close is stored whole), any other text in the
-    // given form. Replaces (and frees) the field's string only when the element has at least
-    // one character of text; true when it did. A failed copy throws and leaves the field as is.
+    // given form, copied once into mArena. Replaces the field's string only when the element has
+    // at least one character of text; true when it did. A failed copy throws and leaves the
+    // field as is.
     bool ReadElementText(void* node, char*& field, TextForm form);
     // ReadElementText in the decoded form: what most record fields hold.
     void GetElementText(void* node, char*& field);
@@ -48,12 +85,26 @@ public:
 
     // Looks up an attribute: true when it exists with at least one character.
     bool ReadAttribute(void* node, const char* name, char** value, int& length);
-    // Replaces field with a copy of the attribute's raw value when it is present; true when it
-    // did. A failed copy throws and leaves the field as is.
+    // Replaces field with a copy (in mArena) of the attribute's raw value when it is present;
+    // true when it did. A failed copy throws and leaves the field as is.
     bool CopyAttribute(void* node, const char* name, char*& field);
+    // Field := a copy (in mArena) of value when it is present; true when it did.
+    bool CopyAttribute(const XMLAttributeValue& value, char*& field);
+    // Reads the attributes of node named in names in one pass over the element's attributes:
+    // values[i] (empty when given) becomes the first attribute called names[i], as
+    // GetAttributeValue would find it. One or two names, and every name for a module that does
+    // not walk attributes, are looked up one by one instead.
+    template <size_t N>
+    void ReadAttributes(void* node, const XMLAttributeNames<N>& names,
+                        XMLAttributeValue (&values)[N]) {
+        ReadAttributeList(node, names.names, names.byLength, values, N);
+    }
 
     void* mXMLHandle;
     XMLParserAPI mXMLAPI;
+    // Where the copies of the text and attribute readers go: the arena of the records being
+    // built. Set by the parser that owns or shares it; never null while a parser reads.
+    ka::Arena* mArena;
 
 protected:
     // The child walk of both parsers' LoadTag: calls (parser->*handler)(child, target, name,
@@ -75,4 +126,10 @@ protected:
             child = sibling;
         }
     }
+
+private:
+    void ReadAttributeList(void* node, const XMLAttributeName* names, const uint32_t* byLength,
+                           XMLAttributeValue* values, size_t count);
+
+    bool mBorrowedXML;  // mXMLHandle and mXMLAPI are another object's
 };

@@ -8,7 +8,7 @@
 // records and build the same again), and the heap in use must be the same before Open and after
 // Close (counted in blocks). KA_UPDATE_EXPECTED=1 writes the .out files instead of comparing.
 //
-// Two of the cases are also run with allocation failures injected, one allocation at a time:
+// Three of the cases are also run with allocation failures injected, one allocation at a time:
 // for N = 0, 1, 2, ... the (N+1)th allocation of the first Process fails, until an armed run
 // completes without reaching it. "library" fails only the operator new calls of the library's
 // own code, and the Process then gives the ordinary records or KA_ERR_NO_MEMORY with nothing
@@ -318,9 +318,12 @@ TEST_P(AllocationFailure, EndsInAResultCodeAndLeavesTheHandleUsable) {
     printf("%ld runs, all but the last failing one allocation\n", n);
 }
 
+// The records of a Process come from a few arena chunks; arena_chunks.xml fills several of
+// them and has texts that get blocks of their own, so that a failure lands at each growth.
 INSTANTIATE_TEST_SUITE_P(Documents, AllocationFailure,
                          ::testing::Values(Injected{"vmap/vmap-inline-vast.xml", false, true},
                                            Injected{"vast/chain_three.xml", true, true},
+                                           Injected{"vast/arena_chunks.xml", true, true},
                                            Injected{"vmap/vmap-inline-vast.xml", false, false},
                                            Injected{"vast/chain_three.xml", true, false}));
 

@@ -1,6 +1,7 @@
 // CDATA unwrapping, "&amp;" decoding and clock times; the cases are in tests/data/text_cases.txt.
 #include <gtest/gtest.h>
 
+#include <cstdlib>
 #include <cstring>
 #include <string>
 #include <vector>
@@ -27,8 +28,14 @@ TEST(TextHelpers, Cases) {
                 EXPECT_EQ(i < size ? '\0' : 'Z', dst[i]) << i;
             }
         } else if (f[0] == "amp") {
+            std::vector<char> copy(f[1].size() + 1, 'Z');
+            EXPECT_EQ(f[2].size(), ka::CopyDecodingAmp(copy.data(), f[1].data(), f[1].size()));
+            EXPECT_EQ(f[2], copy.data());
             EXPECT_EQ(0, unescape_amp(&f[1][0]));
             EXPECT_EQ(f[2], f[1].c_str());
+        } else if (f[0] == "atoi") {
+            EXPECT_EQ(std::stoi(f[2]), ka::Atoi(f[1].c_str()));
+            EXPECT_EQ(std::stoi(f[2]), atoi(f[1].c_str()));
         } else {
             EXPECT_EQ(
                 std::stoul(f[2]),
