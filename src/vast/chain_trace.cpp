@@ -44,14 +44,12 @@ const char* OwnError(const AdData* ad) {
 
 }  // namespace
 
-void ChainTrace::BeginDocument(const char* rootError) {
-    mRootError = rootError != nullptr ? rootError : "";
-}
+void ChainTrace::BeginDocument(const char* rootError) { mRootError = rootError; }
 
 void ChainTrace::BeginAd(AdData* ad, uint64_t mergeRefusals) {
-    mAds.push_back(AdTrace{
-        ad, KA_CHAIN_NOT_WRAPPED, KA_VAST_ERROR_NONE, KA_CHAIN_REASON_NONE, {}, {}, mergeRefusals});
-    if (!mRootError.empty()) mAds.back().errorUrls.push_back({mRootError});
+    mAds.push_back(AdTrace{ad, KA_CHAIN_NOT_WRAPPED, KA_VAST_ERROR_NONE, KA_CHAIN_REASON_NONE,
+                           mHops.size(), 0, mErrorUrls.size(), 0, mergeRefusals});
+    AddErrorUrl(mRootError);
     AddErrorUrl(OwnError(ad));
     if (ad->body == nullptr) {
         End(KA_CHAIN_NOT_WRAPPED, KA_CHAIN_REASON_NO_BODY);
@@ -86,7 +84,9 @@ void ChainTrace::End(uint32_t state, uint32_t reason) {
 }
 
 void ChainTrace::AddHop(HopTrace hop) {
-    if (!mAds.empty()) mAds.back().hops.push_back(std::move(hop));
+    if (mAds.empty()) return;
+    mHops.push_back(hop);
+    ++mAds.back().hopCount;
 }
 
 void ChainTrace::EndAd(uint64_t mergeRefusals) {
@@ -98,12 +98,16 @@ void ChainTrace::EndAd(uint64_t mergeRefusals) {
 }
 
 void ChainTrace::Clear() {
-    mRootError.clear();
+    mRootError = nullptr;
     mAds.clear();
+    mHops.clear();
+    mErrorUrls.clear();
 }
 
 void ChainTrace::AddErrorUrl(const char* url) {
-    if (!mAds.empty() && url != nullptr && url[0] != '\0') mAds.back().errorUrls.push_back({url});
+    if (mAds.empty() || url == nullptr || url[0] == '\0') return;
+    mErrorUrls.push_back({url});
+    ++mAds.back().errorUrlCount;
 }
 
 }  // namespace ka

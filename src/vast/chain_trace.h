@@ -1,12 +1,14 @@
 // What the wrapper chains of one Process did, recorded while they run: one AdTrace per ad of the
 // player's document, with every download, and along the path that leads to the ad the player
 // gets (the first ad of each wrapped document) the Error URLs and how the chain ended. Strings
-// are copied as the chain goes: the merge frees the wrappers' own. CVMAPParser turns the trace
-// into the public KaChainOutcome records when Process ends (outcome_records.h).
+// are not copied: they live in the handle's arena, which keeps what the merge releases until the
+// records themselves are released. CVMAPParser turns the trace into the public KaChainOutcome
+// records when Process ends (outcome_records.h). The lists keep their room from one Process to
+// the next, so a handle that reads similar documents allocates nothing here after the first.
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
-#include <string>
 #include <vector>
 
 #include "ka/vast_records.h"
@@ -14,8 +16,8 @@
 namespace ka {
 
 struct HopTrace {
-    std::string url;       // as handed to the download
-    std::string finalUrl;  // after redirects; empty when the download failed
+    const char* url;       // as handed to the download
+    const char* finalUrl;  // after redirects; null when the download failed
     uint32_t depth;        // of the document fetched: 1 below the player's
     uint32_t result;       // the download's code
     uint64_t bytes;        // read
@@ -23,20 +25,20 @@ struct HopTrace {
     bool onPath;  // leads to the ad the player gets
 };
 
-// A string of the library's own type: a std::vector<std::string> would be instantiated with
+// A string of the library's own type: a std::vector<const char*> would be instantiated with
 // default visibility and exported from the library.
-struct TraceText {
-    std::string text;
+struct TraceUrl {
+    const char* url;
 };
 
 struct AdTrace {
-    AdData* ad;          // the player's node
-    uint32_t state;      // KA_CHAIN_*
-    uint32_t vastError;  // KA_VAST_ERROR_*
-    uint32_t reason;     // KA_CHAIN_REASON_*
-    std::vector<HopTrace> hops;
-    std::vector<TraceText> errorUrls;
-    uint64_t mergeRefusalsBefore;  // the budget's count when the chain began
+    AdData* ad;                           // the player's node
+    uint32_t state;                       // KA_CHAIN_*
+    uint32_t vastError;                   // KA_VAST_ERROR_*
+    uint32_t reason;                      // KA_CHAIN_REASON_*
+    size_t firstHop, hopCount;            // in ChainTrace::Hops()
+    size_t firstErrorUrl, errorUrlCount;  // in ChainTrace::ErrorUrls()
+    uint64_t mergeRefusalsBefore;         // the budget's count when the chain began
 };
 
 class ChainTrace {
@@ -55,14 +57,20 @@ public:
     void EndAd(uint64_t mergeRefusals);
 
     const std::vector<AdTrace>& Ads() const { return mAds; }
+    const HopTrace* Hops(const AdTrace& ad) const { return mHops.data() + ad.firstHop; }
+    const TraceUrl* ErrorUrls(const AdTrace& ad) const {
+        return mErrorUrls.data() + ad.firstErrorUrl;
+    }
     // Forgets everything; the list's room stays for the next Process.
     void Clear();
 
 private:
     void AddErrorUrl(const char* url);
 
-    std::string mRootError;  // of the document whose ads begin; empty: none
+    const char* mRootError = nullptr;  // of the document whose ads begin; null: none
     std::vector<AdTrace> mAds;
+    std::vector<HopTrace> mHops;       // every ad's, in the order of mAds
+    std::vector<TraceUrl> mErrorUrls;  // every ad's, in the order of mAds
 };
 
 }  // namespace ka

@@ -76,8 +76,13 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     if (chain.trace != nullptr) {
         const bool ok = downloaded == 0 && buffer != nullptr;
         const uint64_t ms = ka::MonotonicMs() - start;
-        chain.trace->AddHop({url, ok ? (fetch.finalUrl[0] != '\0' ? fetch.finalUrl : url) : "",
-                             mVastAdData.depth + 1, downloaded, size,
+        // The trace keeps pointers: the strings go where the records live.
+        const char* asked = mArena->CopyString(url);
+        const char* reached = !ok ? nullptr
+                              : fetch.finalUrl[0] == '\0' || strcmp(fetch.finalUrl, url) == 0
+                                  ? asked
+                                  : mArena->CopyString(fetch.finalUrl);
+        chain.trace->AddHop({asked, reached, mVastAdData.depth + 1, downloaded, size,
                              static_cast<uint32_t>(ms > UINT32_MAX ? UINT32_MAX : ms), onPath});
     }
     // A document larger than what is left spends the byte budget: later wrappers are not
