@@ -4,6 +4,7 @@
 #include <cstring>
 
 #include "ka/result_codes.h"
+#include "ka/vast_extras.h"
 #include "ka/vmap_parser_api.h"
 #include "platform/limits.h"
 #include "vast/outcome_records.h"
@@ -152,6 +153,12 @@ unsigned int CVMAPParser::SetParam(unsigned int id, void* value) {
         case KA_PID_VMAP_BASE_URL:
             mBaseUrl = value != nullptr ? static_cast<const char*>(value) : "";
             break;
+        case KA_PID_VMAP_READ_EXTRAS:
+            mReadExtras = value != nullptr;
+            break;
+        case KA_PID_VMAP_LENIENT:
+            mLenient = value != nullptr;
+            break;
         default:
             break;
     }
@@ -228,6 +235,7 @@ void CVMAPParser::CreateVASTParser() {
     mVastParser = new CVASTParser();
     mVastParser->SetWorkPath(mWorkPath);
     mVastParser->UseArena(&mRecords);
+    mVastParser->mReadExtras = mReadExtras;
     // The document it reads is this handle's or goes through this handle's module, which stays
     // loaded from Open to Close.
     mVastParser->BorrowXMLParser(*this);

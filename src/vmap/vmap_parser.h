@@ -45,6 +45,8 @@ public:
     // Writes the chain outcomes of the last Process (null when it read no ad) when out is not
     // null; always 0.
     unsigned int GetChainOutcomes(KaChainOutcome** out);
+    // The extras of an ad body or creative of the last Process (ka/vast_extras.h); null: none.
+    const ka::Arena& Records() const { return mRecords; }
 
     // Close without unloading the module: the handle stays open; always 0.
     unsigned int Reset();
@@ -79,6 +81,8 @@ public:
     unsigned int mVastOnly;
     unsigned int mMergeWrappers;
     KA_BOOL* mStopFlag;
+    bool mReadExtras = true;  // KA_PID_VMAP_READ_EXTRAS
+    bool mLenient = false;    // KA_PID_VMAP_LENIENT
 
 private:
     // Everything Close does before unloading the module.
