@@ -171,7 +171,7 @@ typedef struct KaNonLinear {
     uint64_t minSuggestedDuration; /* milliseconds; 0 when absent */
     char* apiFramework;            /* attribute "apiFramework" */
     KaResource* resources;         /* its Static/IFrame/HTML resources */
-    char* adParameters;            /* <AdParameters>, as written */
+    char* adParameters;            /* <AdParameters> */
     char* clickThrough;            /* <NonLinearClickThrough> */
     KaUrl* clickTrackings;         /* <NonLinearClickTracking>, then wrappers' */
     struct KaNonLinear* next;      /* next overlay of the block */
@@ -198,7 +198,7 @@ typedef struct KaCompanion {
     char* pxratio;              /* attribute "pxratio", as written */
     char* renderingMode;        /* "default", "end-card" or "concurrent" */
     KaResource* resources;      /* its Static/IFrame/HTML resources */
-    char* adParameters;         /* <AdParameters>, as written */
+    char* adParameters;         /* <AdParameters> */
     char* altText;              /* <AltText> */
     char* clickThrough;         /* <CompanionClickThrough> */
     KaUrl* clickTrackings;      /* <CompanionClickTracking>, then wrappers' */

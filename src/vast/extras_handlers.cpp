@@ -111,7 +111,7 @@ void CVASTParser::LoadAdExtra(void* node, char* name, unsigned int nameLength) {
         AdExtras();
         (name[0] == 'C' ? mAdBuild.categories : mAdBuild.blocked).Add(category);
         CopyAttribute(node, "authority", category->authority);
-        ReadElementText(node, category->code, TextForm::kDecoded);
+        GetElementText(node, category->code);
     } else if (NameIs(name, nameLength, "Pricing")) {
         KaAdExtras* extras = AdExtras();
         if (extras->pricing == nullptr) extras->pricing = mArena->New<KaPricing>();
@@ -206,7 +206,7 @@ unsigned int CVASTParser::LoadVerificationTag(void* node, void* target, char* na
         if (!script) CopyAttribute(values[2], resource->type);
         GetElementText(node, resource->url);
     } else if (NameIs(name, nameLength, "VerificationParameters")) {
-        ReadElementText(node, verification->verificationParameters, TextForm::kRaw);
+        GetElementText(node, verification->verificationParameters);
     } else if (NameIs(name, nameLength, "TrackingEvents")) {
         LoadTag(node, &t, &CVASTParser::LoadExtraTrackingTag);
     }
@@ -242,9 +242,7 @@ bool CVASTParser::LoadResource(void* node, char* name, unsigned int nameLength,
     list.Add(resource);
     resource->kind = kind;
     if (kind == KA_RESOURCE_STATIC) CopyAttribute(node, "creativeType", resource->creativeType);
-    // Markup keeps its entities; URLs get "&amp;" decoded.
-    ReadElementText(node, resource->content,
-                    kind == KA_RESOURCE_HTML ? TextForm::kRaw : TextForm::kDecoded);
+    GetElementText(node, resource->content);
     return true;
 }
 
@@ -330,7 +328,7 @@ unsigned int CVASTParser::LoadNonLinearTag(void* node, void* target, char* name,
     KaNonLinear* nonLinear = static_cast<KaNonLinear*>(t.record);
     if (LoadResource(node, name, nameLength, t.resources)) return KA_OK;
     if (NameIs(name, nameLength, "AdParameters")) {
-        ReadElementText(node, nonLinear->adParameters, TextForm::kRaw);
+        GetElementText(node, nonLinear->adParameters);
     } else if (NameIs(name, nameLength, "NonLinearClickThrough")) {
         GetElementText(node, nonLinear->clickThrough);
     } else if (NameIs(name, nameLength, "NonLinearClickTracking")) {
@@ -379,9 +377,9 @@ unsigned int CVASTParser::LoadCompanionTag(void* node, void* target, char* name,
     KaCompanion* companion = static_cast<KaCompanion*>(t.record);
     if (LoadResource(node, name, nameLength, t.resources)) return KA_OK;
     if (NameIs(name, nameLength, "AdParameters")) {
-        ReadElementText(node, companion->adParameters, TextForm::kRaw);
+        GetElementText(node, companion->adParameters);
     } else if (NameIs(name, nameLength, "AltText")) {
-        ReadElementText(node, companion->altText, TextForm::kDecoded);
+        GetElementText(node, companion->altText);
     } else if (NameIs(name, nameLength, "CompanionClickThrough")) {
         GetElementText(node, companion->clickThrough);
     } else if (NameIs(name, nameLength, "CompanionClickTracking")) {
@@ -456,7 +454,7 @@ unsigned int CVASTParser::LoadFallbackImageTag(void* node, void* target, char* n
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
     KaFallbackImage* image = static_cast<KaFallbackImage*>(target);
     if (NameIs(name, nameLength, "AltText")) {
-        ReadElementText(node, image->altText, TextForm::kDecoded);
+        GetElementText(node, image->altText);
     } else if (NameIs(name, nameLength, "StaticResource")) {
         CopyAttribute(node, "creativeType", image->creativeType);
         GetElementText(node, image->url);

@@ -85,6 +85,20 @@ public:
     bool mLenient = false;    // KA_PID_VMAP_LENIENT
 
 private:
+    // KA_PID_VMAP_LENIENT: the prefixes the root binds to the VMAP namespace (declarations on
+    // other elements are not seen), kept as pointers into the document being read.
+    void FindVmapPrefixes(void* root);
+    // Whether name is the VMAP element local: "vmap:" + local, and when lenient also local
+    // alone or under a prefix FindVmapPrefixes found.
+    bool IsVmap(const char* name, unsigned int length, const char* local) const;
+    struct Prefix {
+        const char* name;
+        unsigned int length;
+    };
+    static constexpr unsigned int kMaxVmapPrefixes = 4;
+    Prefix mPrefixes[kMaxVmapPrefixes] = {};
+    unsigned int mPrefixCount = 0;
+
     // Everything Close does before unloading the module.
     void ReleaseAll();
     // Turns the trace of the Process that ends into the records GetChainOutcomes lends.

@@ -4,6 +4,8 @@
 #include <cstdlib>
 #include <cstring>
 
+#include "extras_printer.h"
+#include "json_block.h"
 #include "ka/result_codes.h"
 #include "result_text.h"
 
@@ -83,9 +85,13 @@ const char* TypeName(uint32_t type) {
     }
 }
 
+}  // namespace
+
 void Indent(FILE* out, int level) {
     for (int i = 0; i < level; ++i) fputs("  ", out);
 }
+
+namespace {
 
 void PrintImpressions(FILE* out, int level, const AdImpression* impressions) {
     ForEach(impressions, [out, level](const AdImpression& impression, uint32_t) {
@@ -266,6 +272,8 @@ size_t Utf8Sequence(const unsigned char* p, size_t* bad) {
 // JSON strings: quotes, backslashes and control characters escaped, well-formed UTF-8 as it is,
 // and each broken UTF-8 sequence replaced by U+FFFD, so that the output is valid JSON whatever
 // bytes the document held.
+}  // namespace
+
 void JsonString(FILE* out, const char* text) {
     if (text == nullptr) {
         fputs("null", out);
@@ -313,57 +321,10 @@ void JsonString(FILE* out, const char* text) {
     fputc('"', out);
 }
 
+namespace {
+
 // One JSON object or array whose members go on lines of their own; level is the indentation
 // of the line that holds the opening bracket. An empty one prints as {} or [].
-class JsonBlock {
-public:
-    JsonBlock(FILE* out, int level, char open)
-        : mOut(out), mLevel(level), mClose(open == '{' ? '}' : ']'), mEmpty(true) {
-        fputc(open, out);
-    }
-    void Key(const char* key) {
-        Next();
-        fprintf(mOut, "\"%s\": ", key);
-    }
-    void Item() { Next(); }
-    // Indentation of blocks nested in this one.
-    int Inner() const { return mLevel + 1; }
-    void End() {
-        if (!mEmpty) {
-            fputc('\n', mOut);
-            Indent(mOut, mLevel);
-        }
-        fputc(mClose, mOut);
-    }
-
-private:
-    void Next() {
-        fputs(mEmpty ? "\n" : ",\n", mOut);
-        Indent(mOut, mLevel + 1);
-        mEmpty = false;
-    }
-
-    FILE* mOut;
-    int mLevel;
-    char mClose;
-    bool mEmpty;
-};
-
-void JsonKeyString(FILE* out, JsonBlock& block, const char* key, const char* value) {
-    block.Key(key);
-    JsonString(out, value);
-}
-
-void JsonKeyU64(FILE* out, JsonBlock& block, const char* key, uint64_t value) {
-    block.Key(key);
-    fprintf(out, "%" PRIu64, value);
-}
-
-void JsonKeyI64(FILE* out, JsonBlock& block, const char* key, int64_t value) {
-    block.Key(key);
-    fprintf(out, "%" PRId64, value);
-}
-
 // The extensions object belongs to the host that built it: only its presence is shown.
 void JsonExtensions(FILE* out, JsonBlock& block, const CAdExtensions* extensions) {
     block.Key("extensions");
@@ -473,10 +434,11 @@ void JsonLinear(FILE* out, JsonBlock& parent, const AdLinear& linear) {
     o.End();
 }
 
-void JsonCreatives(FILE* out, JsonBlock& parent, const AdCreative* creatives) {
+void JsonCreatives(FILE* out, JsonBlock& parent, const AdCreative* creatives,
+                   const ProcessResult& result) {
     parent.Key("creatives");
     JsonBlock list(out, parent.Inner(), '[');
-    ForEach(creatives, [out, &list](const AdCreative& creative, uint32_t) {
+    ForEach(creatives, [out, &list, &result](const AdCreative& creative, uint32_t) {
         list.Item();
         JsonBlock o(out, list.Inner(), '{');
         JsonKeyString(out, o, "id", creative.id);
@@ -484,6 +446,11 @@ void JsonCreatives(FILE* out, JsonBlock& parent, const AdCreative* creatives) {
         JsonKeyString(out, o, "adId", creative.adId);
         JsonKeyU64(out, o, "kind", creative.kind);
         JsonLinear(out, o, creative.content);
+        if (result.extrasApi != nullptr) {
+            const KaCreativeExtras* extras = nullptr;
+            result.extrasApi->GetCreativeExtras(result.handle, &creative, &extras);
+            JsonCreativeExtras(out, o, extras);
+        }
         o.End();
     });
     list.End();
@@ -512,14 +479,14 @@ void JsonBody(FILE* out, JsonBlock& parent, const AdData& ad, const ProcessResul
         JsonKeyString(out, o, "error", inLine.error);
         JsonExtensions(out, o, inLine.extensions);
         JsonKeyU64(out, o, "creativeCount", inLine.creativeCount);
-        JsonCreatives(out, o, inLine.creatives);
+        JsonCreatives(out, o, inLine.creatives, result);
     } else {
         const AdWrapper& wrapper = *static_cast<const AdWrapper*>(ad.body);
         JsonKeyString(out, o, "adSystem", wrapper.adSystem);
         JsonKeyString(out, o, "vastAdTagUri", wrapper.vastAdTagUri);
         JsonKeyString(out, o, "error", wrapper.error);
         JsonImpressions(out, o, wrapper.impressions);
-        JsonCreatives(out, o, wrapper.creatives);
+        JsonCreatives(out, o, wrapper.creatives, result);
         JsonExtensions(out, o, wrapper.extensions);
         // A nested parser is shown by the container it lends through the table.
         o.Key("nestedParser");
@@ -532,6 +499,11 @@ void JsonBody(FILE* out, JsonBlock& parent, const AdData& ad, const ProcessResul
         } else {
             JsonVast(out, nested, o.Inner(), result, nesting + 1);
         }
+    }
+    if (result.extrasApi != nullptr) {
+        const KaAdExtras* extras = nullptr;
+        result.extrasApi->GetAdExtras(result.handle, &ad, &extras);
+        JsonAdExtras(out, o, extras);
     }
     o.End();
 }
