@@ -1,5 +1,9 @@
 #include "extras_printer.h"
 
+#include <cstdlib>
+#include <cstring>
+#include <string>
+
 namespace {
 
 // A list under key: each record printed by fields into its own block.
@@ -224,4 +228,61 @@ void JsonCreativeExtras(FILE* out, JsonBlock& parent, const KaCreativeExtras* e)
     NonLinearAds(out, o, e->nonLinearAds);
     CompanionAds(out, o, e->companionAds);
     o.End();
+}
+
+namespace {
+
+// The JSON of print, as indented "key: value" lines: only the values that are set (no null, no
+// empty list or object), list items marked "-".
+template <typename Print>
+void AsText(FILE* out, int level, Print print) {
+    char* text = nullptr;
+    size_t length = 0;
+    FILE* memory = open_memstream(&text, &length);
+    if (memory == nullptr) return;
+    {
+        JsonBlock root(memory, 0, '{');
+        print(memory, root);
+        root.End();
+    }
+    fclose(memory);
+    const char* line = text;
+    bool item = false;  // the next line opens an item of a list
+    while (line != nullptr && *line != '\0') {
+        const char* end = strchr(line, '\n');
+        std::string s(line, end != nullptr ? static_cast<size_t>(end - line) : strlen(line));
+        line = end != nullptr ? end + 1 : nullptr;
+        const size_t indent = s.find_first_not_of(' ');
+        if (indent == std::string::npos) continue;
+        std::string body = s.substr(indent);
+        if (!body.empty() && body.back() == ',') body.pop_back();
+        // A "{" of its own opens a list item; objects under a key open on the key's line.
+        if (body == "{" && indent > 0) item = true;
+        if (body == "{" || body == "}" || body == "]" || body == "[" || body == "[]") continue;
+        const size_t colon = body.find("\": ");
+        if (body[0] == '"' && colon != std::string::npos) {
+            std::string value = body.substr(colon + 3);
+            if (value == "null" || value == "[]" || value == "{}") continue;
+            body = body.substr(1, colon - 1) + ":" +
+                   (value == "{" || value == "[" ? std::string() : " " + value);
+        }
+        Indent(out, level + static_cast<int>(indent / 2) - 1);
+        fprintf(out, "%s%s\n", item ? "- " : "", body.c_str());
+        item = false;
+    }
+    free(text);
+}
+
+}  // namespace
+
+void PrintAdExtras(FILE* out, int level, const KaAdExtras* extras) {
+    if (extras == nullptr) return;
+    AsText(out, level,
+           [extras](FILE* memory, JsonBlock& root) { JsonAdExtras(memory, root, extras); });
+}
+
+void PrintCreativeExtras(FILE* out, int level, const KaCreativeExtras* extras) {
+    if (extras == nullptr) return;
+    AsText(out, level,
+           [extras](FILE* memory, JsonBlock& root) { JsonCreativeExtras(memory, root, extras); });
 }

@@ -156,20 +156,26 @@ void PrintLinear(FILE* out, int level, const AdLinear& linear) {
             });
 }
 
-void PrintCreatives(FILE* out, int level, const AdCreative* creatives) {
-    ForEach(creatives, [out, level](const AdCreative& creative, uint32_t i) {
+void PrintCreatives(FILE* out, int level, const AdCreative* creatives,
+                    const ProcessResult& result) {
+    ForEach(creatives, [out, level, &result](const AdCreative& creative, uint32_t i) {
         Indent(out, level);
         fprintf(out, "creative %" PRIu32 ": id %s, sequence %" PRId32 ", adId %s, %s\n", i + 1,
                 OrDash(creative.id), creative.sequence, OrDash(creative.adId),
                 creative.kind == AD_CREATIVE_LINEAR ? "linear" : "not read");
         if (creative.kind == AD_CREATIVE_LINEAR) PrintLinear(out, level + 1, creative.content);
+        if (result.extrasApi != nullptr) {
+            const KaCreativeExtras* extras = nullptr;
+            result.extrasApi->GetCreativeExtras(result.handle, &creative, &extras);
+            PrintCreativeExtras(out, level + 1, extras);
+        }
     });
 }
 
 void PrintVast(FILE* out, int level, const VastAdData& data, const ProcessResult& result,
                unsigned int nesting);
 
-void PrintInLine(FILE* out, int level, const AdInLine& inLine) {
+void PrintInLine(FILE* out, int level, const AdInLine& inLine, const ProcessResult& result) {
     const struct {
         const char* label;
         const char* value;
@@ -185,7 +191,7 @@ void PrintInLine(FILE* out, int level, const AdInLine& inLine) {
     fprintf(out, "%" PRIu32 " impressions, %" PRIu32 " creatives%s\n", inLine.impressionCount,
             inLine.creativeCount, inLine.extensions != nullptr ? ", extensions" : "");
     PrintImpressions(out, level, inLine.impressions);
-    PrintCreatives(out, level, inLine.creatives);
+    PrintCreatives(out, level, inLine.creatives, result);
 }
 
 void PrintWrapper(FILE* out, int level, const AdWrapper& wrapper, const ProcessResult& result,
@@ -203,7 +209,7 @@ void PrintWrapper(FILE* out, int level, const AdWrapper& wrapper, const ProcessR
         fputs("extensions: present\n", out);
     }
     PrintImpressions(out, level, wrapper.impressions);
-    PrintCreatives(out, level, wrapper.creatives);
+    PrintCreatives(out, level, wrapper.creatives, result);
     if (wrapper.nestedParser == nullptr || result.nestedVast == nullptr) return;
     Indent(out, level);
     VastAdData* nested = nullptr;
@@ -227,8 +233,13 @@ void PrintVast(FILE* out, int level, const VastAdData& data, const ProcessResult
         fprintf(out, "ad %" PRIu32 ": id %s, sequence %" PRId32 ", %s\n", i + 1, OrDash(ad.id),
                 ad.sequence, TypeName(ad.type));
         if (ad.body == nullptr) return;
+        if (result.extrasApi != nullptr) {
+            const KaAdExtras* extras = nullptr;
+            result.extrasApi->GetAdExtras(result.handle, &ad, &extras);
+            PrintAdExtras(out, level + 1, extras);
+        }
         if (ad.type == AD_TYPE_INLINE) {
-            PrintInLine(out, level + 1, *static_cast<const AdInLine*>(ad.body));
+            PrintInLine(out, level + 1, *static_cast<const AdInLine*>(ad.body), result);
         } else if (ad.type == AD_TYPE_WRAPPER) {
             PrintWrapper(out, level + 1, *static_cast<const AdWrapper*>(ad.body), result, nesting);
         }
