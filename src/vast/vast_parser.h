@@ -143,8 +143,9 @@ public:
     unsigned int LoadFallbackImageTag(void* node, void* target, char* name,
                                       unsigned int nameLength);
     unsigned int LoadCaptionsTag(void* node, void* target, char* name, unsigned int nameLength);
-    // Appends the extras of the wrapper body to those of the InLine body and the wrapper
-    // creatives' companion and non-linear tracking to inlineCreatives' (extras_merge.cpp).
+    // Appends copies of the wrapper body's verifications and viewability URLs to the InLine
+    // body's extras, and of its creatives' companion and non-linear tracking to those of the
+    // InLine's creatives (extras_merge.cpp).
     void MergeExtras(const AdWrapper* wrapper, const AdInLine* inLine);
 
     // Releases (vast_release.cpp): forward to the functions of vast_release.h, which free
