@@ -274,7 +274,7 @@ int Run(const Options& options, const VMAPParserAPI& api, const VMAPParserExtAPI
     }
     records.outcomes = outcomes;
     // A library without the lookups shows no extras.
-    if (options.extras && ext.GetCreativeExtras != nullptr) {
+    if (options.extras && ext.GetNestedCreativeExtras != nullptr) {
         records.extrasApi = &ext;
         records.handle = handle;
     }

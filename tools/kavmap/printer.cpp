@@ -30,6 +30,28 @@ void ForEach(const Record* first, Visit visit) {
 
 const char* OrDash(const char* text) { return text != nullptr ? text : "-"; }
 
+// The records of a wrapper's nested parser look their extras up on that parser.
+ProcessResult Nested(const ProcessResult& result, const AdWrapper& wrapper) {
+    ProcessResult nested = result;
+    nested.handle = wrapper.nestedParser;
+    nested.nestedOwner = true;
+    return nested;
+}
+
+const KaAdExtras* AdExtrasOf(const ProcessResult& result, const AdData& ad) {
+    const KaAdExtras* extras = nullptr;
+    (result.nestedOwner ? result.extrasApi->GetNestedAdExtras : result.extrasApi->GetAdExtras)(
+        result.handle, &ad, &extras);
+    return extras;
+}
+
+const KaCreativeExtras* CreativeExtrasOf(const ProcessResult& result, const AdCreative& c) {
+    const KaCreativeExtras* extras = nullptr;
+    (result.nestedOwner ? result.extrasApi->GetNestedCreativeExtras
+                        : result.extrasApi->GetCreativeExtras)(result.handle, &c, &extras);
+    return extras;
+}
+
 void PrintBreakType(FILE* out, uint32_t flags) {
     static const struct {
         uint32_t flag;
@@ -165,8 +187,7 @@ void PrintCreatives(FILE* out, int level, const AdCreative* creatives,
                 creative.kind == AD_CREATIVE_LINEAR ? "linear" : "not read");
         if (creative.kind == AD_CREATIVE_LINEAR) PrintLinear(out, level + 1, creative.content);
         if (result.extrasApi != nullptr) {
-            const KaCreativeExtras* extras = nullptr;
-            result.extrasApi->GetCreativeExtras(result.handle, &creative, &extras);
+            const KaCreativeExtras* extras = CreativeExtrasOf(result, creative);
             PrintCreativeExtras(out, level + 1, extras);
         }
     });
@@ -219,7 +240,7 @@ void PrintWrapper(FILE* out, int level, const AdWrapper& wrapper, const ProcessR
         return;
     }
     fputs("wrapped document:\n", out);
-    PrintVast(out, level + 1, *nested, result, nesting + 1);
+    PrintVast(out, level + 1, *nested, Nested(result, wrapper), nesting + 1);
 }
 
 void PrintVast(FILE* out, int level, const VastAdData& data, const ProcessResult& result,
@@ -234,8 +255,7 @@ void PrintVast(FILE* out, int level, const VastAdData& data, const ProcessResult
                 ad.sequence, TypeName(ad.type));
         if (ad.body == nullptr) return;
         if (result.extrasApi != nullptr) {
-            const KaAdExtras* extras = nullptr;
-            result.extrasApi->GetAdExtras(result.handle, &ad, &extras);
+            const KaAdExtras* extras = AdExtrasOf(result, ad);
             PrintAdExtras(out, level + 1, extras);
         }
         if (ad.type == AD_TYPE_INLINE) {
@@ -458,8 +478,7 @@ void JsonCreatives(FILE* out, JsonBlock& parent, const AdCreative* creatives,
         JsonKeyU64(out, o, "kind", creative.kind);
         JsonLinear(out, o, creative.content);
         if (result.extrasApi != nullptr) {
-            const KaCreativeExtras* extras = nullptr;
-            result.extrasApi->GetCreativeExtras(result.handle, &creative, &extras);
+            const KaCreativeExtras* extras = CreativeExtrasOf(result, creative);
             JsonCreativeExtras(out, o, extras);
         }
         o.End();
@@ -508,12 +527,11 @@ void JsonBody(FILE* out, JsonBlock& parent, const AdData& ad, const ProcessResul
                    result.nestedVast(wrapper.nestedParser, &nested) != KA_OK || nested == nullptr) {
             fputs("\"not shown\"", out);
         } else {
-            JsonVast(out, nested, o.Inner(), result, nesting + 1);
+            JsonVast(out, nested, o.Inner(), Nested(result, wrapper), nesting + 1);
         }
     }
     if (result.extrasApi != nullptr) {
-        const KaAdExtras* extras = nullptr;
-        result.extrasApi->GetAdExtras(result.handle, &ad, &extras);
+        const KaAdExtras* extras = AdExtrasOf(result, ad);
         JsonAdExtras(out, o, extras);
     }
     o.End();

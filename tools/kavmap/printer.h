@@ -26,6 +26,7 @@ struct ProcessResult {
     // up on handle; null: the records alone, as without the option.
     const VMAPParserExtAPI* extrasApi;
     void* handle;
+    bool nestedOwner;  // handle is a wrapper's nestedParser: the GetNested* slots apply
 };
 
 // Nested parsers are shown down to this many levels below the document; the library stops
