@@ -7,6 +7,7 @@
 #include <fstream>
 #include <sstream>
 
+#include "ka/vast_extras.h"
 #include "source_io_api.h"
 
 namespace bench {
@@ -131,10 +132,11 @@ const VMAPParserAPI& Library() {
     return api;
 }
 
-ParserHandle::ParserHandle(bool vastOnly) {
+ParserHandle::ParserHandle(bool vastOnly, bool readExtras) {
     // Open keeps the path by pointer: the string lives as long as the program.
     if (Library().Open(&mHandle, &gModulesDir[0]) != 0 || mHandle == nullptr) Fail("Open failed");
     if (vastOnly) Library().SetParam(mHandle, KA_PID_VMAP_VAST_ONLY, reinterpret_cast<void*>(1));
+    if (!readExtras) Library().SetParam(mHandle, KA_PID_VMAP_READ_EXTRAS, nullptr);
 }
 
 ParserHandle::~ParserHandle() { Library().Close(mHandle); }

@@ -46,7 +46,7 @@ void AllowLocalFiles(const char* baseDir);
 // One opened handle of the library, in VAST-only mode when asked; closed by the destructor.
 class ParserHandle {
 public:
-    explicit ParserHandle(bool vastOnly);
+    explicit ParserHandle(bool vastOnly, bool readExtras = true);
     ~ParserHandle();
     ParserHandle(const ParserHandle&) = delete;
     ParserHandle& operator=(const ParserHandle&) = delete;

@@ -1,7 +1,8 @@
 // Process through the public table, beside the XML module's own load of the same buffers, for
 // each of the four cases. The ratio of the two times is the library's own overhead; it is
 // printed at the end of the run, per document (a case of two documents reads both per
-// iteration).
+// iteration), with the cost of the VAST 4 extras: Process with them (the default) over Process
+// without (KA_PID_VMAP_READ_EXTRAS off).
 //
 //   process_bench [--lib PATH] [--modules DIR] [benchmark options]   (DIR ends with "/")
 #include <cstdio>
@@ -10,8 +11,8 @@
 
 namespace {
 
-void ProcessDocument(benchmark::State& state, const bench::Document* document) {
-    bench::ParserHandle handle(document->vastOnly);
+void Run(benchmark::State& state, const bench::Document* document, bool readExtras) {
+    bench::ParserHandle handle(document->vastOnly, readExtras);
     if (handle.ProcessAll(*document) != 0) {
         state.SkipWithError("Process failed");
         return;
@@ -21,6 +22,14 @@ void ProcessDocument(benchmark::State& state, const bench::Document* document) {
     }
     state.SetBytesProcessed(static_cast<int64_t>(state.iterations()) *
                             static_cast<int64_t>(document->Bytes()));
+}
+
+void ProcessDocument(benchmark::State& state, const bench::Document* document) {
+    Run(state, document, true);
+}
+
+void ProcessWithoutExtras(benchmark::State& state, const bench::Document* document) {
+    Run(state, document, false);
 }
 
 void LoadDocument(benchmark::State& state, const bench::Document* document) {
@@ -46,6 +55,8 @@ int main(int argc, char** argv) {
         benchmark::RegisterBenchmark(("Process/" + document.name).c_str(), ProcessDocument,
                                      &document);
         benchmark::RegisterBenchmark(("Load/" + document.name).c_str(), LoadDocument, &document);
+        benchmark::RegisterBenchmark(("NoExtras/" + document.name).c_str(), ProcessWithoutExtras,
+                                     &document);
     }
     benchmark::Initialize(&argc, argv);
     if (benchmark::ReportUnrecognizedArguments(argc, argv)) return 1;
@@ -54,16 +65,17 @@ int main(int argc, char** argv) {
     benchmark::Shutdown();
 
     // Lowest CPU time per iteration of each, over the repetitions asked for, per document.
-    printf("\n%-12s %10s %14s %14s %16s\n", "document", "bytes", "Process (us)", "load (us)",
-           "Process / load");
+    printf("\n%-12s %10s %14s %14s %16s %16s\n", "document", "bytes", "Process (us)", "load (us)",
+           "Process / load", "extras on / off");
     for (const bench::Document& document : bench::Documents()) {
         const double count = static_cast<double>(document.buffers.size());
         const double process = reporter.CpuTime("Process/" + document.name) / count;
         const double load = reporter.CpuTime("Load/" + document.name) / count;
-        if (process <= 0.0 || load <= 0.0) continue;
-        printf("%-12s %10.0f %14.1f %14.1f %16.2f\n", document.name.c_str(),
+        const double off = reporter.CpuTime("NoExtras/" + document.name) / count;
+        if (process <= 0.0 || load <= 0.0 || off <= 0.0) continue;
+        printf("%-12s %10.0f %14.1f %14.1f %16.2f %16.2f\n", document.name.c_str(),
                static_cast<double>(document.Bytes()) / count, process / 1000.0, load / 1000.0,
-               process / load);
+               process / load, process / off);
     }
     return 0;
 }

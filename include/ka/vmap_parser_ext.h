@@ -9,6 +9,7 @@
 
 #include "ka/export.h"
 #include "ka/result_codes.h"
+#include "ka/vast_extras.h"
 #include "ka/vast_records.h"
 
 #ifdef __cplusplus
@@ -204,6 +205,17 @@ typedef struct VMAPParserExtAPI {
     /* kaExpandVASTMacros, for a player that looked up only the entry. */
     uint32_t (*ExpandMacros)(const char* urlTemplate, const KaMacroValues* values, char* out,
                              uint32_t outSize, uint32_t* outLength);
+    /* The extras (ka/vast_extras.h) of an ad or creative of the handle's records, nested
+     * parsers' included, through *out: null when it has none. An ad's extras follow its body,
+     * so an ad the merge filled with a wrapped InLine gives the InLine's, with its wrappers'
+     * verifications and viewability pings appended. They live as long as the records. */
+    uint32_t (*GetAdExtras)(void* handle, const AdData* ad, const KaAdExtras** out);
+    uint32_t (*GetCreativeExtras)(void* handle, const AdCreative* creative,
+                                  const KaCreativeExtras** out);
+    /* The same from a nested parser (an unmerged wrapper's nestedParser, as slot 6 takes). */
+    uint32_t (*GetNestedAdExtras)(void* parser, const AdData* ad, const KaAdExtras** out);
+    uint32_t (*GetNestedCreativeExtras)(void* parser, const AdCreative* creative,
+                                        const KaCreativeExtras** out);
 } VMAPParserExtAPI;
 
 /* Fills *api as described above; KA_ERR_NULL_ARGUMENT when api is null or its size holds no

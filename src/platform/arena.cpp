@@ -66,6 +66,7 @@ void* Arena::AllocateSlow(size_t size, size_t align) {
 }
 
 void Arena::Reset() {
+    sideIndex = nullptr;
     FreeList(mOwn);
     mOwn = nullptr;
     // The first chunks stay, up to kKeptBytes; a Process that needed more builds the rest anew.

@@ -70,6 +70,10 @@ public:
     // Bytes of the chunks and own blocks held now, headers left out.
     size_t HeldBytes() const;
 
+    // The side records keyed by record pointers (vast/extras_records.h), kept in this arena;
+    // Reset forgets them with everything else.
+    void* sideIndex = nullptr;
+
     // The largest alignment handed out: that of every record.
     static constexpr size_t kAlignment = 16;
     // Chunk sizes and what Reset keeps: platform/limits.h.

@@ -25,11 +25,13 @@ unsigned int CVASTParser::LoadVASTTag(void* node, void* target, char* name,
 
 unsigned int CVASTParser::LoadAdAttributes(void* node, AdData* ad) {
     if (node == nullptr || ad == nullptr) return KA_OK;
-    static constexpr auto kNames = ka::AttributeNames("id", "sequence");
-    XMLAttributeValue values[2];
+    static constexpr auto kNames = ka::AttributeNames("id", "sequence", "adType");
+    XMLAttributeValue values[3];
     ReadAttributes(node, kNames, values);
     CopyAttribute(values[0], ad->id);
     if (values[1].Present()) ad->sequence = ka::Atoi(values[1].value);
+    mPendingAdType = nullptr;
+    if (mReadExtras) CopyAttribute(values[2], mPendingAdType);
     return KA_OK;
 }
 
@@ -42,10 +44,12 @@ unsigned int CVASTParser::LoadAdTag(void* node, void* target, char* name, unsign
         ad->type = AD_TYPE_INLINE;
         AdInLine* inLine = mArena->New<AdInLine>();
         ad->body = inLine;
+        BeginAdExtras(node, inLine, false);
         LoadTag(node, inLine, &CVASTParser::LoadInLineTag);
     } else if (NameIs(name, nameLength, "Wrapper")) {
         ad->type = AD_TYPE_WRAPPER;
         ad->body = mArena->New<AdWrapper>();
+        BeginAdExtras(node, ad->body, true);
         LoadTag(node, ad, &CVASTParser::LoadWrapperTag);
     } else {
         // Any other child before the body marks the ad as InLine, still without a body.
@@ -93,7 +97,10 @@ unsigned int CVASTParser::LoadInLineTag(void* node, void* target, char* name,
     } else if (NameIs(name, nameLength, "Creatives")) {
         LoadTag(node, inLine, &CVASTParser::LoadCreativesTag);
     } else if (NameIs(name, nameLength, "Extensions")) {
+        if (mReadExtras) LoadAdExtra(node, name, nameLength);
         return LoadExtensions(node, inLine->extensions);
+    } else if (mReadExtras) {
+        LoadAdExtra(node, name, nameLength);
     }
     return KA_OK;
 }
@@ -124,7 +131,10 @@ unsigned int CVASTParser::LoadWrapperTag(void* node, void* target, char* name,
     } else if (NameIs(name, nameLength, "Creatives")) {
         LoadTag(node, &wrapper->creatives, &CVASTParser::LoadCreative);
     } else if (NameIs(name, nameLength, "Extensions")) {
+        if (mReadExtras) LoadAdExtra(node, name, nameLength);
         return LoadExtensions(node, wrapper->extensions);
+    } else if (mReadExtras) {
+        LoadAdExtra(node, name, nameLength);
     }
     return KA_OK;
 }

@@ -13,6 +13,7 @@ unsigned int CVASTParser::LoadCreative(void* node, void* target, char* name,
     if (!NameIs(name, nameLength, "Creative")) return KA_ERR_LOAD_FAILED;
     AdCreative* creative = mArena->New<AdCreative>();
     mCreativeTail.Append(static_cast<AdCreative**>(target), creative);
+    BeginCreativeExtras(creative);
     LoadCreativeAttributes(node, creative);
     LoadTag(node, creative, &CVASTParser::LoadCreativeTag);
     return KA_OK;
@@ -20,20 +21,25 @@ unsigned int CVASTParser::LoadCreative(void* node, void* target, char* name,
 
 unsigned int CVASTParser::LoadCreativeAttributes(void* node, AdCreative* creative) {
     if (node == nullptr || creative == nullptr) return KA_OK;
-    static constexpr auto kNames = ka::AttributeNames("id", "sequence", "adId");
-    XMLAttributeValue values[3];
+    static constexpr auto kNames =
+        ka::AttributeNames("id", "sequence", "adId", "apiFramework", "AdID");
+    XMLAttributeValue values[5];
     ReadAttributes(node, kNames, values);
     CopyAttribute(values[0], creative->id);
     if (values[1].Present()) creative->sequence = ka::Atoi(values[1].value);
     CopyAttribute(values[2], creative->adId);
+    LoadCreativeExtraAttributes(values[3], values[4]);
     return KA_OK;
 }
 
 unsigned int CVASTParser::LoadCreativeTag(void* node, void* target, char* name,
                                           unsigned int nameLength) {
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
-    // Only linear content is kept; non-linear and companion content is skipped.
-    if (!NameIs(name, nameLength, "Linear")) return KA_OK;
+    // Only linear content is kept in the records; the rest goes to the extras.
+    if (!NameIs(name, nameLength, "Linear")) {
+        if (mReadExtras) LoadCreativeExtra(node, name, nameLength);
+        return KA_OK;
+    }
     AdCreative* creative = static_cast<AdCreative*>(target);
     creative->kind = AD_CREATIVE_LINEAR;
     LoadTag(node, &creative->content, &CVASTParser::LoadLinearTag);

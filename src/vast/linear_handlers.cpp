@@ -56,7 +56,8 @@ unsigned int CVASTParser::LoadLinearTag(void* node, void* target, char* name,
     } else if (NameIs(name, nameLength, "TrackingEvents")) {
         LoadTag(node, linear, &CVASTParser::LoadTrackingEventsTag);
     } else if (NameIs(name, nameLength, "Icons")) {
-        LoadTag(node, linear, &CVASTParser::LoadIgnoredTag);
+        LoadTag(node, linear,
+                mReadExtras ? &CVASTParser::LoadIconsTag : &CVASTParser::LoadIgnoredTag);
     }
     return KA_OK;
 }
@@ -86,7 +87,10 @@ unsigned int CVASTParser::LoadSkipOffset(void* node, AdLinear* linear) {
 unsigned int CVASTParser::LoadMediaFilesTag(void* node, void* target, char* name,
                                             unsigned int nameLength) {
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
-    if (!NameIs(name, nameLength, "MediaFile")) return KA_OK;
+    if (!NameIs(name, nameLength, "MediaFile")) {
+        if (mReadExtras) LoadMediaExtra(node, name, nameLength);
+        return KA_OK;
+    }
     AdLinear* linear = static_cast<AdLinear*>(target);
     linear->mediaFileCount++;
     AdMediaFile* mediaFile = mArena->New<AdMediaFile>();
@@ -99,10 +103,10 @@ unsigned int CVASTParser::LoadMediaFilesTag(void* node, void* target, char* name
 unsigned int CVASTParser::LoadMediaFileAttributes(void* node, AdMediaFile* mediaFile) {
     if (node == nullptr || mediaFile == nullptr) return KA_OK;
     // Media files carry most of their attributes: all are read in one pass, in this order.
-    static constexpr auto kNames =
-        ka::AttributeNames("delivery", "type", "width", "height", "codec", "id", "bitrate",
-                           "minBitrate", "maxBitrate", "scalable", "maintainAspectRatio");
-    XMLAttributeValue values[11];
+    static constexpr auto kNames = ka::AttributeNames(
+        "delivery", "type", "width", "height", "codec", "id", "bitrate", "minBitrate", "maxBitrate",
+        "scalable", "maintainAspectRatio", "fileSize", "mediaType", "apiFramework");
+    XMLAttributeValue values[14];
     ReadAttributes(node, kNames, values);
     if (values[0].Present()) {
         const unsigned int size = static_cast<unsigned int>(values[0].length);
@@ -122,6 +126,7 @@ unsigned int CVASTParser::LoadMediaFileAttributes(void* node, AdMediaFile* media
     ReadNumber(values[8], mediaFile->maxBitrate);
     ReadNumber(values[9], mediaFile->scalable);
     ReadNumber(values[10], mediaFile->maintainAspectRatio);
+    LoadMediaFileExtras(mediaFile, values + 11);
     return KA_OK;
 }
 

@@ -164,4 +164,7 @@ void CVASTParser::ResetTails() {
     mClickThroughTail.Reset();
     mClickTrackingTail.Reset();
     mCustomClickTail.Reset();
+    mAdBuild = ka::AdExtrasBuild();
+    mCreativeBuild = ka::CreativeExtrasBuild();
+    mPendingAdType = nullptr;
 }

@@ -9,6 +9,7 @@
 #include "ka/types.h"
 #include "ka/vast_records.h"
 #include "vast/chain_context.h"
+#include "vast/extras_records.h"
 #include "xml/record_lists.h"
 #include "xml/xml_document.h"
 
@@ -109,6 +110,44 @@ public:
     void CopyClickList(const AdClick* list, ka::ListEnd<AdClick>& end, uint32_t& count);
     void CopyTrackingList(const AdTracking* list, ka::ListEnd<AdTracking>& end, uint32_t& count);
 
+    // VAST 4 extras (extras_handlers.cpp): records of ka/vast_extras.h indexed beside the
+    // records (extras_records.h), read in the same walk. The record handlers call these for
+    // elements and attributes they do not keep.
+    // Starts the extras of a new ad body: the Ad's adType, the Wrapper's attributes.
+    void BeginAdExtras(void* bodyNode, const void* body, bool wrapper);
+    void BeginCreativeExtras(const AdCreative* creative);
+    // A child of InLine or Wrapper; a child of Creative other than Linear; a child of MediaFiles
+    // other than MediaFile.
+    void LoadAdExtra(void* node, char* name, unsigned int nameLength);
+    void LoadCreativeExtra(void* node, char* name, unsigned int nameLength);
+    void LoadMediaExtra(void* node, char* name, unsigned int nameLength);
+    void LoadCreativeExtraAttributes(const XMLAttributeValue& apiFramework,
+                                     const XMLAttributeValue& legacyAdId);
+    // values: fileSize, mediaType, apiFramework.
+    void LoadMediaFileExtras(const AdMediaFile* mediaFile, const XMLAttributeValue* values);
+    struct ExtrasTarget;
+    unsigned int LoadExtensionExtraTag(void* node, void* target, char* name,
+                                       unsigned int nameLength);
+    unsigned int LoadViewableTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadVerificationsTag(void* node, void* target, char* name,
+                                      unsigned int nameLength);
+    unsigned int LoadVerificationTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadExtraTrackingTag(void* node, void* target, char* name,
+                                      unsigned int nameLength);
+    unsigned int LoadNonLinearAdsTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadNonLinearTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadCompanionAdsTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadCompanionTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadIconsTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadIconTag(void* node, void* target, char* name, unsigned int nameLength);
+    unsigned int LoadFallbackImageTag(void* node, void* target, char* name,
+                                      unsigned int nameLength);
+    unsigned int LoadCaptionsTag(void* node, void* target, char* name, unsigned int nameLength);
+    // Appends copies of the wrapper body's verifications and viewability URLs to the InLine
+    // body's extras, and of its creatives' companion and non-linear tracking to those of the
+    // InLine's creatives (extras_merge.cpp).
+    void MergeExtras(const AdWrapper* wrapper, const AdInLine* inLine);
+
     // Releases (vast_release.cpp): forward to the functions of vast_release.h, which free
     // everything below the record, null what they freed, accept null and always return 0.
     unsigned int ReleaseVastAdData(VastAdData* data);
@@ -124,6 +163,7 @@ public:
     KA_BOOL* mStopFlag;                  // stop flag of the last Process; null without one
     unsigned int mFetchesLeft;           // fetches left to the last chain this parser headed
     ka::ChainBudget* mBudget;            // the budget of the chain being read; null: none
+    bool mReadExtras = true;             // KA_PID_VMAP_READ_EXTRAS; nested parsers inherit it
 
 private:
     // <Extensions> of an InLine or Wrapper into its extensions field: the Parse result.
@@ -144,6 +184,18 @@ private:
     // tracking, custom clicks (of each source's first VideoClicks) and tracking events of count
     // Linear sources, in their order, to target, walking each list of target to its end once.
     void AppendLinearTracking(AdLinear* target, AdLinear* const* sources, size_t count);
+    // The extras of the ad or creative being read, made and indexed on first need.
+    KaAdExtras* AdExtras();
+    KaCreativeExtras* CreativeExtras();
+    // A Static/IFrame/HTML resource appended to list; false for any other element.
+    bool LoadResource(void* node, char* name, unsigned int nameLength, ka::Tail<KaResource>& list);
+    // A URL element (text and "id") appended to list.
+    void AppendUrl(void* node, ka::Tail<KaUrl>& list);
+    // Copies of the extras lists for the merge, charged to the budget like the others.
+    void CopyUrlList(const KaUrl* list, ka::Tail<KaUrl>& end);
+    void CopyExtraTracking(const AdTracking* list, ka::Tail<AdTracking>& end, uint32_t& count);
+    void CopyVerifications(const KaVerification* list, ka::Tail<KaVerification>& end);
+
     // Forgets the remembered list ends; called around every walk and by every release.
     void ResetTails();
 
@@ -159,4 +211,8 @@ private:
     ka::ListTail<AdClick> mClickThroughTail;
     ka::ListTail<AdClick> mClickTrackingTail;
     ka::ListTail<AdClick> mCustomClickTail;
+    // The ad and creative whose extras are being read.
+    ka::AdExtrasBuild mAdBuild;
+    ka::CreativeExtrasBuild mCreativeBuild;
+    char* mPendingAdType = nullptr;  // the Ad's adType, until its body is made
 };

@@ -103,6 +103,7 @@ unsigned int CVASTParser::FetchWrapper(AdData* ad, ka::ChainContext& chain) {
     wrapper->nestedParser = nested;
     // Its records join this parser's: the merge moves them into this document's list.
     nested->UseArena(mArena);
+    nested->mReadExtras = mReadExtras;
     nested->SetWorkPath(chain.workPath);
     // A failed load shows up as a failed Process below.
     nested->InitXMLParser();
@@ -162,6 +163,7 @@ unsigned int CVASTParser::MergeWrapper(AdData* ad) {
             CopyImpressionList(wrapper->impressions, end, inLine->impressionCount);
             inLine->impressionCount = end.count;
             MergeCreatives(wrapper, inLine->creatives);
+            MergeExtras(wrapper, inLine);
         }
     }
 

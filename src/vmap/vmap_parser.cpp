@@ -4,6 +4,7 @@
 #include <cstring>
 
 #include "ka/result_codes.h"
+#include "ka/vast_extras.h"
 #include "ka/vmap_parser_api.h"
 #include "platform/limits.h"
 #include "vast/outcome_records.h"
@@ -101,6 +102,7 @@ unsigned int CVMAPParser::Process(void* buffer, unsigned int size) {
     void* root = nullptr;
     GetFirstChild(nullptr, &root);
     if (root == nullptr) return KA_ERR_LOAD_FAILED;
+    if (mLenient) FindVmapPrefixes(root);
     // Any root name is accepted: documents differ in how they spell it.
     LoadTag(root, &mAdInfo, &CVMAPParser::LoadVMAPTag);
     PublishOutcomes();
@@ -151,6 +153,12 @@ unsigned int CVMAPParser::SetParam(unsigned int id, void* value) {
         }
         case KA_PID_VMAP_BASE_URL:
             mBaseUrl = value != nullptr ? static_cast<const char*>(value) : "";
+            break;
+        case KA_PID_VMAP_READ_EXTRAS:
+            mReadExtras = value != nullptr;
+            break;
+        case KA_PID_VMAP_LENIENT:
+            mLenient = value != nullptr;
             break;
         default:
             break;
@@ -228,6 +236,7 @@ void CVMAPParser::CreateVASTParser() {
     mVastParser = new CVASTParser();
     mVastParser->SetWorkPath(mWorkPath);
     mVastParser->UseArena(&mRecords);
+    mVastParser->mReadExtras = mReadExtras;
     // The document it reads is this handle's or goes through this handle's module, which stays
     // loaded from Open to Close.
     mVastParser->BorrowXMLParser(*this);
@@ -286,12 +295,58 @@ unsigned int CVMAPParser::LoadTag(void* node, void* target, TagHandler handler) 
     return KA_OK;
 }
 
+void CVMAPParser::FindVmapPrefixes(void* root) {
+    static const char kUri[] = "http://www.iab.net/videosuite/vmap";
+    mPrefixCount = 0;
+    void* current = nullptr;
+    // Bounded by the root's attributes, which the module has already read.
+    for (;;) {
+        void* next = nullptr;
+        char* name = nullptr;
+        char* value = nullptr;
+        int nameLength = 0;
+        int valueLength = 0;
+        if (GetNextAttribute(root, &next, current, &name, nameLength, &value, valueLength) !=
+                KA_OK ||
+            next == nullptr) {
+            return;
+        }
+        current = next;
+        if (name == nullptr || value == nullptr || nameLength <= 6 ||
+            memcmp(name, "xmlns:", 6) != 0 || valueLength != static_cast<int>(sizeof(kUri) - 1) ||
+            memcmp(value, kUri, sizeof(kUri) - 1) != 0) {
+            continue;
+        }
+        if (mPrefixCount < kMaxVmapPrefixes) {
+            mPrefixes[mPrefixCount] = {name + 6, static_cast<unsigned int>(nameLength - 6)};
+            ++mPrefixCount;
+        }
+    }
+}
+
+bool CVMAPParser::IsVmap(const char* name, unsigned int length, const char* local) const {
+    const unsigned int n = static_cast<unsigned int>(strlen(local));
+    if (length == n + 5 && memcmp(name, "vmap:", 5) == 0 && memcmp(name + 5, local, n) == 0) {
+        return true;
+    }
+    if (!mLenient || length < n || memcmp(name + length - n, local, n) != 0) return false;
+    if (length == n) return true;
+    const unsigned int prefix = length - n - 1;
+    if (name[prefix] != ':') return false;
+    for (unsigned int i = 0; i < mPrefixCount; ++i) {
+        if (mPrefixes[i].length == prefix && memcmp(mPrefixes[i].name, name, prefix) == 0) {
+            return true;
+        }
+    }
+    return false;
+}
+
 unsigned int CVMAPParser::LoadVMAPTag(void* node, void* target, char* name, unsigned int length) {
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
     AdInfo* info = static_cast<AdInfo*>(target);
-    if (ka::NameIs(name, length, "vmap:Extensions")) {
+    if (IsVmap(name, length, "Extensions")) {
         ReadContentUri(node);
-    } else if (ka::NameIs(name, length, "vmap:AdBreak")) {
+    } else if (IsVmap(name, length, "AdBreak")) {
         ++info->adBreakCount;
         AdBreak* adBreak = mRecords.New<AdBreak>();
         mBreakTail.Append(&mAdInfo.adBreaks, adBreak);
@@ -332,14 +387,14 @@ unsigned int CVMAPParser::LoadAdBreakTag(void* node, void* target, char* name,
                                          unsigned int length) {
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
     AdBreak* adBreak = static_cast<AdBreak*>(target);
-    if (ka::NameIs(name, length, "vmap:AdSource")) {
+    if (IsVmap(name, length, "AdSource")) {
         // The first source wins; a later one is skipped whole.
         if (adBreak->adSource != nullptr) return KA_OK;
         adBreak->adSource = mRecords.New<AdSource>();
         ParseAdSourceAttributes(node, adBreak->adSource);
         LoadTag(node, adBreak->adSource, &CVMAPParser::LoadAdSourceTag);
         SumLinearDuration(adBreak);
-    } else if (ka::NameIs(name, length, "vmap:TrackingEvents")) {
+    } else if (IsVmap(name, length, "TrackingEvents")) {
         LoadTag(node, adBreak, &CVMAPParser::LoadTrackingTag);
     }
     return KA_OK;
@@ -360,11 +415,10 @@ unsigned int CVMAPParser::LoadAdSourceTag(void* node, void* target, char* name,
                                           unsigned int length) {
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
     AdSource* source = static_cast<AdSource*>(target);
-    if (ka::NameIs(name, length, "vmap:AdTagURI")) {
+    if (IsVmap(name, length, "AdTagURI")) {
         // Stored as text only; the player decides whether to fetch it.
         GetElementText(node, source->adTagUri);
-    } else if (ka::NameIs(name, length, "vmap:VASTAdData") ||
-               ka::NameIs(name, length, "vmap:VASTData")) {
+    } else if (IsVmap(name, length, "VASTAdData") || IsVmap(name, length, "VASTData")) {
         // Only the first of either is read.
         if (source->vastAdData != nullptr) return KA_OK;
         source->vastAdData = mRecords.New<VastAdData>();
@@ -376,7 +430,7 @@ unsigned int CVMAPParser::LoadAdSourceTag(void* node, void* target, char* name,
 unsigned int CVMAPParser::LoadTrackingTag(void* node, void* target, char* name,
                                           unsigned int length) {
     if (node == nullptr || target == nullptr || name == nullptr) return KA_OK;
-    if (!ka::NameIs(name, length, "vmap:Tracking")) return KA_OK;
+    if (!IsVmap(name, length, "Tracking")) return KA_OK;
     AdBreak* adBreak = static_cast<AdBreak*>(target);
     AdBreakTracking* tracking = mRecords.New<AdBreakTracking>();
     mTrackingTail.Append(&adBreak->trackings, tracking);

@@ -45,6 +45,8 @@ public:
     // Writes the chain outcomes of the last Process (null when it read no ad) when out is not
     // null; always 0.
     unsigned int GetChainOutcomes(KaChainOutcome** out);
+    // The extras of an ad body or creative of the last Process (ka/vast_extras.h); null: none.
+    const ka::Arena& Records() const { return mRecords; }
 
     // Close without unloading the module: the handle stays open; always 0.
     unsigned int Reset();
@@ -79,8 +81,24 @@ public:
     unsigned int mVastOnly;
     unsigned int mMergeWrappers;
     KA_BOOL* mStopFlag;
+    bool mReadExtras = true;  // KA_PID_VMAP_READ_EXTRAS
+    bool mLenient = false;    // KA_PID_VMAP_LENIENT
 
 private:
+    // KA_PID_VMAP_LENIENT: the prefixes the root binds to the VMAP namespace (declarations on
+    // other elements are not seen), kept as pointers into the document being read.
+    void FindVmapPrefixes(void* root);
+    // Whether name is the VMAP element local: "vmap:" + local, and when lenient also local
+    // alone or under a prefix FindVmapPrefixes found.
+    bool IsVmap(const char* name, unsigned int length, const char* local) const;
+    struct Prefix {
+        const char* name;
+        unsigned int length;
+    };
+    static constexpr unsigned int kMaxVmapPrefixes = 4;
+    Prefix mPrefixes[kMaxVmapPrefixes] = {};
+    unsigned int mPrefixCount = 0;
+
     // Everything Close does before unloading the module.
     void ReleaseAll();
     // Turns the trace of the Process that ends into the records GetChainOutcomes lends.

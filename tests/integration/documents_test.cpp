@@ -1,8 +1,10 @@
 // Every document under tests/data/documents/<mode>/ read through the public table over the real
 // modules and printed as kavmap --json prints it; the output must equal <name>.out beside the
 // document, byte for byte. Documents named *.wrapped.xml are fetched by the cases' wrappers.
-// The folder names the mode: vmap, vmap-no-merge, vast, vast-no-merge. Wrapped documents are
-// read as local files below the case's folder, the base URL of each case being its own file.
+// The folder names the mode: vmap, vmap-no-merge, vast, vast-no-merge, and the same with
+// "-extras", read with KA_PID_VMAP_LENIENT and printed as kavmap --json --extras prints them.
+// Wrapped documents are read as local files below the case's folder, the base URL of each case
+// being its own file.
 //
 // Each case is processed twice on one handle (the second Process must release the first's
 // records and build the same again), and the heap in use must be the same before Open and after
@@ -46,7 +48,8 @@ void PrintTo(const Case& c, std::ostream* out) { *out << c.mode << "/" << c.name
 
 std::vector<Case> Cases() {
     std::vector<Case> cases;
-    for (const char* mode : {"vmap", "vmap-no-merge", "vast", "vast-no-merge"}) {
+    for (const char* mode : {"vmap", "vmap-no-merge", "vast", "vast-no-merge", "vmap-extras",
+                             "vast-extras", "vast-no-merge-extras"}) {
         DIR* dir = opendir((kRoot + mode).c_str());
         if (dir == nullptr) continue;
         while (dirent* entry = readdir(dir)) {
@@ -171,12 +174,15 @@ void operator delete[](void* p, const std::nothrow_t&) noexcept { Free(p); }
 namespace {
 
 // The result code and the records of one Process, as text.
-std::string Print(void* handle, uint32_t result, bool vastOnly) {
+std::string Print(void* handle, uint32_t result, bool vastOnly, bool extras) {
     char* text = nullptr;
     size_t length = 0;
     FILE* out = open_memstream(&text, &length);
     fprintf(out, "result 0x%08" PRIx32 "\n", result);
-    PrintJson(out, ReadResult(katest::Api(), handle, vastOnly));
+    ProcessResult records = ReadResult(katest::Api(), handle, vastOnly);
+    if (extras) records.extrasApi = &katest::ExtApi();
+    records.handle = handle;
+    PrintJson(out, records);
     fclose(out);
     std::string printed(text, length);
     free(text);
@@ -187,8 +193,8 @@ std::string Print(void* handle, uint32_t result, bool vastOnly) {
 // When armed, allocation n (from 0) of the first Process fails; gInjection.injected then tells
 // whether it was reached.
 std::vector<std::string> Cycle(std::initializer_list<const std::vector<char>*> inputs,
-                               bool vastOnly, bool merge, std::string base, bool arm = false,
-                               bool libraryOnly = true, long n = 0) {
+                               bool vastOnly, bool merge, bool extras, std::string base,
+                               bool arm = false, bool libraryOnly = true, long n = 0) {
     const VMAPParserAPI& api = katest::Api();
     std::string workPath = KA_MODULES_DIR;
     void* handle = nullptr;
@@ -196,6 +202,7 @@ std::vector<std::string> Cycle(std::initializer_list<const std::vector<char>*> i
     api.SetParam(handle, KA_PID_VMAP_VAST_ONLY, vastOnly ? katest::kUntouched : nullptr);
     api.SetParam(handle, KA_PID_VMAP_MERGE_WRAPPERS, merge ? katest::kUntouched : nullptr);
     api.SetParam(handle, KA_PID_VMAP_BASE_URL, &base[0]);
+    api.SetParam(handle, KA_PID_VMAP_LENIENT, extras ? katest::kUntouched : nullptr);
     std::vector<std::string> printed;
     printed.reserve(inputs.size());
     gInjection = {false, libraryOnly, n, false};
@@ -206,7 +213,7 @@ std::vector<std::string> Cycle(std::initializer_list<const std::vector<char>*> i
         const uint32_t result = api.Process(handle, copy.empty() ? &empty : copy.data(),
                                             static_cast<uint32_t>(copy.size()));
         gInjection.armed = false;
-        printed.push_back(Print(handle, result, vastOnly));
+        printed.push_back(Print(handle, result, vastOnly, extras));
     }
     EXPECT_EQ(api.Close(handle), KA_OK);
     return printed;
@@ -231,6 +238,7 @@ TEST_P(Documents, ReadIntoTheExpectedRecords) {
         const auto p =
             Cycle({&document, &interleaved, &document}, c.mode.compare(0, 4, "vast") == 0,
                   c.mode.find("no-merge") == std::string::npos,
+                  c.mode.find("extras") != std::string::npos,
                   "file://localhost" + folder + c.name + ".xml");
         EXPECT_EQ(p[2], p[0]) << "a second Process built other records";
         printed = p[0];
@@ -291,7 +299,7 @@ TEST_P(AllocationFailure, EndsInAResultCodeAndLeavesTheHandleUsable) {
     FindLibraryText();
     ASSERT_LT(gLibraryText[0], gLibraryText[1]);
     auto run = [&](bool arm, long n) {
-        return Cycle({&document, &document}, c.vastOnly, true, "file://localhost" + path, arm,
+        return Cycle({&document, &document}, c.vastOnly, true, true, "file://localhost" + path, arm,
                      c.libraryOnly, n);
     };
     // Also warms the modules' one-time state, which the block count must not see.
@@ -299,7 +307,7 @@ TEST_P(AllocationFailure, EndsInAResultCodeAndLeavesTheHandleUsable) {
     ASSERT_EQ(ordinary.compare(0, 18, "result 0x00000000\n"), 0) << ordinary;
     const std::string nothing = [&] {
         katest::Handle empty;
-        return Print(empty.get(), KA_ERR_NO_MEMORY, c.vastOnly);
+        return Print(empty.get(), KA_ERR_NO_MEMORY, c.vastOnly, true);
     }();
     long n = 0;
     for (bool injected = true; injected && !HasFailure(); ++n) {
@@ -324,6 +332,8 @@ INSTANTIATE_TEST_SUITE_P(Documents, AllocationFailure,
                          ::testing::Values(Injected{"vmap/vmap-inline-vast.xml", false, true},
                                            Injected{"vast/chain_three.xml", true, true},
                                            Injected{"vast/arena_chunks.xml", true, true},
+                                           Injected{"vast-extras/inline_full.xml", true, true},
+                                           Injected{"vast-extras/chain_extras.xml", true, true},
                                            Injected{"vmap/vmap-inline-vast.xml", false, false},
                                            Injected{"vast/chain_three.xml", true, false}));
 

@@ -62,7 +62,7 @@ TEST(Kavmap, RunsExitPrintAndFailAsListed) {
     unlink((out + ".out").c_str());
     unlink((out + ".err").c_str());
     EXPECT_EQ(server.Requests(), 2);
-    EXPECT_EQ(rows.size(), 25u);
+    EXPECT_EQ(rows.size(), 29u);
 }
 
 }  // namespace

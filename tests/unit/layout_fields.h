@@ -91,7 +91,67 @@
     X(KaChainOutcome, hops, 24, 8) X(KaChainOutcome, errorUrlCount, 32, 4) \
     X(KaChainOutcome, errorUrls, 40, 8) X(KaChainOutcome, next, 48, 8) \
     X(VMAPParserExtAPI, size, 0, 4) X(VMAPParserExtAPI, GetChainOutcomes, 8, 8) \
-    X(VMAPParserExtAPI, ExpandMacros, 16, 8)
+    X(VMAPParserExtAPI, ExpandMacros, 16, 8) \
+    X(KaUrl, id, 0, 8) X(KaUrl, url, 8, 8) X(KaUrl, next, 16, 8) X(KaResource, kind, 0, 4) \
+    X(KaResource, creativeType, 8, 8) X(KaResource, content, 16, 8) X(KaResource, next, 24, 8) \
+    X(KaCategory, authority, 0, 8) X(KaCategory, code, 8, 8) X(KaCategory, next, 16, 8) \
+    X(KaPricing, model, 0, 8) X(KaPricing, currency, 8, 8) X(KaPricing, value, 16, 8) \
+    X(KaVerificationResource, apiFramework, 0, 8) \
+    X(KaVerificationResource, browserOptional, 8, 4) X(KaVerificationResource, type, 16, 8) \
+    X(KaVerificationResource, url, 24, 8) X(KaVerificationResource, next, 32, 8) \
+    X(KaVerification, vendor, 0, 8) X(KaVerification, javaScriptResources, 8, 8) \
+    X(KaVerification, executableResources, 16, 8) \
+    X(KaVerification, verificationParameters, 24, 8) X(KaVerification, trackingCount, 32, 4) \
+    X(KaVerification, trackingEvents, 40, 8) X(KaVerification, next, 48, 8) \
+    X(KaAdExtras, adType, 0, 8) X(KaAdExtras, adServingId, 8, 8) \
+    X(KaAdExtras, categories, 16, 8) X(KaAdExtras, blockedAdCategories, 24, 8) \
+    X(KaAdExtras, pricing, 32, 8) X(KaAdExtras, expires, 40, 4) X(KaAdExtras, viewable, 48, 8) \
+    X(KaAdExtras, notViewable, 56, 8) X(KaAdExtras, viewUndetermined, 64, 8) \
+    X(KaAdExtras, verifications, 72, 8) X(KaAdExtras, followAdditionalWrappers, 80, 4) \
+    X(KaAdExtras, allowMultipleAds, 84, 4) X(KaAdExtras, fallbackOnNoAd, 88, 4) \
+    X(KaUniversalAdId, idRegistry, 0, 8) X(KaUniversalAdId, idValue, 8, 8) \
+    X(KaUniversalAdId, value, 16, 8) X(KaUniversalAdId, next, 24, 8) \
+    X(KaFallbackImage, width, 0, 4) X(KaFallbackImage, height, 4, 4) \
+    X(KaFallbackImage, altText, 8, 8) X(KaFallbackImage, creativeType, 16, 8) \
+    X(KaFallbackImage, url, 24, 8) X(KaFallbackImage, next, 32, 8) X(KaIcon, program, 0, 8) \
+    X(KaIcon, width, 8, 4) X(KaIcon, height, 12, 4) X(KaIcon, xPosition, 16, 8) \
+    X(KaIcon, yPosition, 24, 8) X(KaIcon, duration, 32, 8) X(KaIcon, offset, 40, 8) \
+    X(KaIcon, apiFramework, 48, 8) X(KaIcon, pxratio, 56, 8) X(KaIcon, resources, 64, 8) \
+    X(KaIcon, clickThrough, 72, 8) X(KaIcon, clickTrackings, 80, 8) \
+    X(KaIcon, fallbackImages, 88, 8) X(KaIcon, viewTrackings, 96, 8) X(KaIcon, next, 104, 8) \
+    X(KaMediaAsset, type, 0, 8) X(KaMediaAsset, delivery, 8, 8) X(KaMediaAsset, width, 16, 4) \
+    X(KaMediaAsset, height, 20, 4) X(KaMediaAsset, codec, 24, 8) X(KaMediaAsset, id, 32, 8) \
+    X(KaMediaAsset, fileSize, 40, 8) X(KaMediaAsset, mediaType, 48, 8) \
+    X(KaMediaAsset, apiFramework, 56, 8) X(KaMediaAsset, variableDuration, 64, 4) \
+    X(KaMediaAsset, language, 72, 8) X(KaMediaAsset, url, 80, 8) X(KaMediaAsset, next, 88, 8) \
+    X(KaMediaFileExtras, mediaFile, 0, 8) X(KaMediaFileExtras, fileSize, 8, 8) \
+    X(KaMediaFileExtras, mediaType, 16, 8) X(KaMediaFileExtras, apiFramework, 24, 8) \
+    X(KaMediaFileExtras, next, 32, 8) X(KaNonLinear, id, 0, 8) X(KaNonLinear, width, 8, 4) \
+    X(KaNonLinear, height, 12, 4) X(KaNonLinear, expandedWidth, 16, 4) \
+    X(KaNonLinear, expandedHeight, 20, 4) X(KaNonLinear, scalable, 24, 4) \
+    X(KaNonLinear, maintainAspectRatio, 28, 4) X(KaNonLinear, minSuggestedDuration, 32, 8) \
+    X(KaNonLinear, apiFramework, 40, 8) X(KaNonLinear, resources, 48, 8) \
+    X(KaNonLinear, adParameters, 56, 8) X(KaNonLinear, clickThrough, 64, 8) \
+    X(KaNonLinear, clickTrackings, 72, 8) X(KaNonLinear, next, 80, 8) \
+    X(KaNonLinearAds, nonLinears, 0, 8) X(KaNonLinearAds, trackingCount, 8, 4) \
+    X(KaNonLinearAds, trackingEvents, 16, 8) X(KaCompanion, id, 0, 8) \
+    X(KaCompanion, width, 8, 4) X(KaCompanion, height, 12, 4) X(KaCompanion, assetWidth, 16, 4) \
+    X(KaCompanion, assetHeight, 20, 4) X(KaCompanion, expandedWidth, 24, 4) \
+    X(KaCompanion, expandedHeight, 28, 4) X(KaCompanion, apiFramework, 32, 8) \
+    X(KaCompanion, adSlotId, 40, 8) X(KaCompanion, pxratio, 48, 8) \
+    X(KaCompanion, renderingMode, 56, 8) X(KaCompanion, resources, 64, 8) \
+    X(KaCompanion, adParameters, 72, 8) X(KaCompanion, altText, 80, 8) \
+    X(KaCompanion, clickThrough, 88, 8) X(KaCompanion, clickTrackings, 96, 8) \
+    X(KaCompanion, trackingCount, 104, 4) X(KaCompanion, trackingEvents, 112, 8) \
+    X(KaCompanion, next, 120, 8) X(KaCompanionAds, required, 0, 8) \
+    X(KaCompanionAds, companions, 8, 8) X(KaCreativeExtras, universalAdIds, 0, 8) \
+    X(KaCreativeExtras, apiFramework, 8, 8) X(KaCreativeExtras, legacyAdId, 16, 8) \
+    X(KaCreativeExtras, icons, 24, 8) X(KaCreativeExtras, mezzanines, 32, 8) \
+    X(KaCreativeExtras, interactiveFiles, 40, 8) X(KaCreativeExtras, closedCaptionFiles, 48, 8) \
+    X(KaCreativeExtras, mediaFiles, 56, 8) X(KaCreativeExtras, nonLinearAds, 64, 8) \
+    X(KaCreativeExtras, companionAds, 72, 8) X(VMAPParserExtAPI, GetAdExtras, 24, 8) \
+    X(VMAPParserExtAPI, GetCreativeExtras, 32, 8) X(VMAPParserExtAPI, GetNestedAdExtras, 40, 8) \
+    X(VMAPParserExtAPI, GetNestedCreativeExtras, 48, 8)
 
 /* X(record, size) */
 #define KA_LAYOUT_SIZES(X) \
@@ -100,7 +160,12 @@
     X(AdTracking, 40) X(AdParameters, 8) X(AdIcon, 8) X(AdInfo, 16) X(AdBreak, 72) \
     X(AdSource, 40) X(AdBreakTracking, 24) X(VMAPParserAPI, 64) \
     X(KaMacroValues, 360) \
-    X(KaChainHop, 40) X(KaChainOutcome, 56) X(VMAPParserExtAPI, 24)
+    X(KaChainHop, 40) X(KaChainOutcome, 56) \
+    X(KaUrl, 24) X(KaResource, 32) X(KaCategory, 24) X(KaPricing, 24) \
+    X(KaVerificationResource, 40) X(KaVerification, 56) X(KaAdExtras, 96) X(KaUniversalAdId, 32) \
+    X(KaFallbackImage, 40) X(KaIcon, 112) X(KaMediaAsset, 96) X(KaMediaFileExtras, 40) \
+    X(KaNonLinear, 88) X(KaNonLinearAds, 24) X(KaCompanion, 128) X(KaCompanionAds, 16) \
+    X(KaCreativeExtras, 80) X(VMAPParserExtAPI, 56)
 
 /* X(constant, value) */
 #define KA_LAYOUT_CONSTANTS(X) \
@@ -128,7 +193,9 @@
     X(KA_CHAIN_REASON_STOPPED, 6u) X(KA_CHAIN_REASON_NOT_XML, 7u) \
     X(KA_CHAIN_REASON_VERSION, 8u) X(KA_CHAIN_REASON_NO_AD, 9u) X(KA_CHAIN_REASON_DEPTH, 10u) \
     X(KA_CHAIN_REASON_FETCHES, 11u) X(KA_CHAIN_REASON_BYTES, 12u) \
-    X(KA_CHAIN_REASON_MERGE_SHARE, 13u)
+    X(KA_CHAIN_REASON_MERGE_SHARE, 13u) \
+    X(KA_PID_VMAP_READ_EXTRAS, 0x44000201u) X(KA_PID_VMAP_LENIENT, 0x44000202u) \
+    X(KA_RESOURCE_STATIC, 1u) X(KA_RESOURCE_IFRAME, 2u) X(KA_RESOURCE_HTML, 3u)
 /* clang-format on */
 
 /* One measured item as the C compiler sees it: a field (offset, size), a record's sizeof (offset

@@ -29,6 +29,8 @@ struct Options {
     bool merge = true;
     bool json = false;
     bool trace = false;                 // print each ad's wrapper chain after the records
+    bool extras = false;                // print the VAST 4 extras of each ad and creative
+    bool lenient = false;               // VMAP elements under any prefix of its namespace
     unsigned long timeoutSeconds = 10;  // every download of the Process together; 0: none
     std::string baseUrl;                // where the document came from
     std::string modulesDir;
@@ -38,13 +40,16 @@ struct Options {
 
 int Usage() {
     fputs(
-        "usage: kavmap [--vast] [--no-merge] [--json] [--trace] [--timeout SECONDS]\n"
+        "usage: kavmap [--vast] [--no-merge] [--json] [--trace] [--extras] [--lenient]\n"
+        "              [--timeout SECONDS]\n"
         "              [--modules DIR] [--lib PATH] DOCUMENT\n"
         "  DOCUMENT     a VMAP file, - for standard input, or an http(s) URL\n"
         "  --vast       read DOCUMENT as a bare VAST document\n"
         "  --no-merge   do not merge wrapper ads into the ads they lead to\n"
         "  --json       print the records as JSON\n"
         "  --trace      also print each ad's wrapper chain: downloads, outcome, Error URLs\n"
+        "  --extras     also print each ad's and creative's VAST 4 extras (companions, icons...)\n"
+        "  --lenient    also read VMAP elements without a prefix or under another one\n"
         "  --timeout    seconds all downloads of wrapped documents may take (default 10, 0: none)\n"
         "  --modules    folder of the platform modules (default: ../modules next to kavmap)\n"
         "  --lib        the parser library (default: ../lib/libkaVMAPParser.so next to kavmap)\n",
@@ -75,6 +80,10 @@ int ParseArguments(int argc, char** argv, Options& options) {
             options.json = true;
         } else if (arg == "--trace") {
             options.trace = true;
+        } else if (arg == "--extras") {
+            options.extras = true;
+        } else if (arg == "--lenient") {
+            options.lenient = true;
         } else if (arg == "--timeout") {
             char* end = nullptr;
             if (i + 1 >= argc) return Usage();
@@ -243,6 +252,8 @@ int Run(const Options& options, const VMAPParserAPI& api, const VMAPParserExtAPI
                  reinterpret_cast<void*>(static_cast<uintptr_t>(options.merge)));
     api.SetParam(handle, KA_PID_VMAP_DEADLINE_MS,
                  reinterpret_cast<void*>(static_cast<uintptr_t>(options.timeoutSeconds * 1000)));
+    if (options.lenient)
+        api.SetParam(handle, KA_PID_VMAP_LENIENT, reinterpret_cast<void*>(uintptr_t{1}));
     std::string baseUrl = options.baseUrl;
     if (!baseUrl.empty()) api.SetParam(handle, KA_PID_VMAP_BASE_URL, &baseUrl[0]);
 
@@ -262,6 +273,11 @@ int Run(const Options& options, const VMAPParserAPI& api, const VMAPParserExtAPI
         ext.GetChainOutcomes(handle, &outcomes);
     }
     records.outcomes = outcomes;
+    // A library without the lookups shows no extras.
+    if (options.extras && ext.GetNestedCreativeExtras != nullptr) {
+        records.extrasApi = &ext;
+        records.handle = handle;
+    }
     if (options.json) {
         PrintJson(stdout, records);
     } else {

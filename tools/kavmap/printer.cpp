@@ -4,6 +4,8 @@
 #include <cstdlib>
 #include <cstring>
 
+#include "extras_printer.h"
+#include "json_block.h"
 #include "ka/result_codes.h"
 #include "result_text.h"
 
@@ -27,6 +29,28 @@ void ForEach(const Record* first, Visit visit) {
 }
 
 const char* OrDash(const char* text) { return text != nullptr ? text : "-"; }
+
+// The records of a wrapper's nested parser look their extras up on that parser.
+ProcessResult Nested(const ProcessResult& result, const AdWrapper& wrapper) {
+    ProcessResult nested = result;
+    nested.handle = wrapper.nestedParser;
+    nested.nestedOwner = true;
+    return nested;
+}
+
+const KaAdExtras* AdExtrasOf(const ProcessResult& result, const AdData& ad) {
+    const KaAdExtras* extras = nullptr;
+    (result.nestedOwner ? result.extrasApi->GetNestedAdExtras : result.extrasApi->GetAdExtras)(
+        result.handle, &ad, &extras);
+    return extras;
+}
+
+const KaCreativeExtras* CreativeExtrasOf(const ProcessResult& result, const AdCreative& c) {
+    const KaCreativeExtras* extras = nullptr;
+    (result.nestedOwner ? result.extrasApi->GetNestedCreativeExtras
+                        : result.extrasApi->GetCreativeExtras)(result.handle, &c, &extras);
+    return extras;
+}
 
 void PrintBreakType(FILE* out, uint32_t flags) {
     static const struct {
@@ -83,9 +107,13 @@ const char* TypeName(uint32_t type) {
     }
 }
 
+}  // namespace
+
 void Indent(FILE* out, int level) {
     for (int i = 0; i < level; ++i) fputs("  ", out);
 }
+
+namespace {
 
 void PrintImpressions(FILE* out, int level, const AdImpression* impressions) {
     ForEach(impressions, [out, level](const AdImpression& impression, uint32_t) {
@@ -150,20 +178,25 @@ void PrintLinear(FILE* out, int level, const AdLinear& linear) {
             });
 }
 
-void PrintCreatives(FILE* out, int level, const AdCreative* creatives) {
-    ForEach(creatives, [out, level](const AdCreative& creative, uint32_t i) {
+void PrintCreatives(FILE* out, int level, const AdCreative* creatives,
+                    const ProcessResult& result) {
+    ForEach(creatives, [out, level, &result](const AdCreative& creative, uint32_t i) {
         Indent(out, level);
         fprintf(out, "creative %" PRIu32 ": id %s, sequence %" PRId32 ", adId %s, %s\n", i + 1,
                 OrDash(creative.id), creative.sequence, OrDash(creative.adId),
                 creative.kind == AD_CREATIVE_LINEAR ? "linear" : "not read");
         if (creative.kind == AD_CREATIVE_LINEAR) PrintLinear(out, level + 1, creative.content);
+        if (result.extrasApi != nullptr) {
+            const KaCreativeExtras* extras = CreativeExtrasOf(result, creative);
+            PrintCreativeExtras(out, level + 1, extras);
+        }
     });
 }
 
 void PrintVast(FILE* out, int level, const VastAdData& data, const ProcessResult& result,
                unsigned int nesting);
 
-void PrintInLine(FILE* out, int level, const AdInLine& inLine) {
+void PrintInLine(FILE* out, int level, const AdInLine& inLine, const ProcessResult& result) {
     const struct {
         const char* label;
         const char* value;
@@ -179,7 +212,7 @@ void PrintInLine(FILE* out, int level, const AdInLine& inLine) {
     fprintf(out, "%" PRIu32 " impressions, %" PRIu32 " creatives%s\n", inLine.impressionCount,
             inLine.creativeCount, inLine.extensions != nullptr ? ", extensions" : "");
     PrintImpressions(out, level, inLine.impressions);
-    PrintCreatives(out, level, inLine.creatives);
+    PrintCreatives(out, level, inLine.creatives, result);
 }
 
 void PrintWrapper(FILE* out, int level, const AdWrapper& wrapper, const ProcessResult& result,
@@ -197,7 +230,7 @@ void PrintWrapper(FILE* out, int level, const AdWrapper& wrapper, const ProcessR
         fputs("extensions: present\n", out);
     }
     PrintImpressions(out, level, wrapper.impressions);
-    PrintCreatives(out, level, wrapper.creatives);
+    PrintCreatives(out, level, wrapper.creatives, result);
     if (wrapper.nestedParser == nullptr || result.nestedVast == nullptr) return;
     Indent(out, level);
     VastAdData* nested = nullptr;
@@ -207,7 +240,7 @@ void PrintWrapper(FILE* out, int level, const AdWrapper& wrapper, const ProcessR
         return;
     }
     fputs("wrapped document:\n", out);
-    PrintVast(out, level + 1, *nested, result, nesting + 1);
+    PrintVast(out, level + 1, *nested, Nested(result, wrapper), nesting + 1);
 }
 
 void PrintVast(FILE* out, int level, const VastAdData& data, const ProcessResult& result,
@@ -221,8 +254,12 @@ void PrintVast(FILE* out, int level, const VastAdData& data, const ProcessResult
         fprintf(out, "ad %" PRIu32 ": id %s, sequence %" PRId32 ", %s\n", i + 1, OrDash(ad.id),
                 ad.sequence, TypeName(ad.type));
         if (ad.body == nullptr) return;
+        if (result.extrasApi != nullptr) {
+            const KaAdExtras* extras = AdExtrasOf(result, ad);
+            PrintAdExtras(out, level + 1, extras);
+        }
         if (ad.type == AD_TYPE_INLINE) {
-            PrintInLine(out, level + 1, *static_cast<const AdInLine*>(ad.body));
+            PrintInLine(out, level + 1, *static_cast<const AdInLine*>(ad.body), result);
         } else if (ad.type == AD_TYPE_WRAPPER) {
             PrintWrapper(out, level + 1, *static_cast<const AdWrapper*>(ad.body), result, nesting);
         }
@@ -266,6 +303,8 @@ size_t Utf8Sequence(const unsigned char* p, size_t* bad) {
 // JSON strings: quotes, backslashes and control characters escaped, well-formed UTF-8 as it is,
 // and each broken UTF-8 sequence replaced by U+FFFD, so that the output is valid JSON whatever
 // bytes the document held.
+}  // namespace
+
 void JsonString(FILE* out, const char* text) {
     if (text == nullptr) {
         fputs("null", out);
@@ -313,57 +352,10 @@ void JsonString(FILE* out, const char* text) {
     fputc('"', out);
 }
 
+namespace {
+
 // One JSON object or array whose members go on lines of their own; level is the indentation
 // of the line that holds the opening bracket. An empty one prints as {} or [].
-class JsonBlock {
-public:
-    JsonBlock(FILE* out, int level, char open)
-        : mOut(out), mLevel(level), mClose(open == '{' ? '}' : ']'), mEmpty(true) {
-        fputc(open, out);
-    }
-    void Key(const char* key) {
-        Next();
-        fprintf(mOut, "\"%s\": ", key);
-    }
-    void Item() { Next(); }
-    // Indentation of blocks nested in this one.
-    int Inner() const { return mLevel + 1; }
-    void End() {
-        if (!mEmpty) {
-            fputc('\n', mOut);
-            Indent(mOut, mLevel);
-        }
-        fputc(mClose, mOut);
-    }
-
-private:
-    void Next() {
-        fputs(mEmpty ? "\n" : ",\n", mOut);
-        Indent(mOut, mLevel + 1);
-        mEmpty = false;
-    }
-
-    FILE* mOut;
-    int mLevel;
-    char mClose;
-    bool mEmpty;
-};
-
-void JsonKeyString(FILE* out, JsonBlock& block, const char* key, const char* value) {
-    block.Key(key);
-    JsonString(out, value);
-}
-
-void JsonKeyU64(FILE* out, JsonBlock& block, const char* key, uint64_t value) {
-    block.Key(key);
-    fprintf(out, "%" PRIu64, value);
-}
-
-void JsonKeyI64(FILE* out, JsonBlock& block, const char* key, int64_t value) {
-    block.Key(key);
-    fprintf(out, "%" PRId64, value);
-}
-
 // The extensions object belongs to the host that built it: only its presence is shown.
 void JsonExtensions(FILE* out, JsonBlock& block, const CAdExtensions* extensions) {
     block.Key("extensions");
@@ -473,10 +465,11 @@ void JsonLinear(FILE* out, JsonBlock& parent, const AdLinear& linear) {
     o.End();
 }
 
-void JsonCreatives(FILE* out, JsonBlock& parent, const AdCreative* creatives) {
+void JsonCreatives(FILE* out, JsonBlock& parent, const AdCreative* creatives,
+                   const ProcessResult& result) {
     parent.Key("creatives");
     JsonBlock list(out, parent.Inner(), '[');
-    ForEach(creatives, [out, &list](const AdCreative& creative, uint32_t) {
+    ForEach(creatives, [out, &list, &result](const AdCreative& creative, uint32_t) {
         list.Item();
         JsonBlock o(out, list.Inner(), '{');
         JsonKeyString(out, o, "id", creative.id);
@@ -484,6 +477,10 @@ void JsonCreatives(FILE* out, JsonBlock& parent, const AdCreative* creatives) {
         JsonKeyString(out, o, "adId", creative.adId);
         JsonKeyU64(out, o, "kind", creative.kind);
         JsonLinear(out, o, creative.content);
+        if (result.extrasApi != nullptr) {
+            const KaCreativeExtras* extras = CreativeExtrasOf(result, creative);
+            JsonCreativeExtras(out, o, extras);
+        }
         o.End();
     });
     list.End();
@@ -512,14 +509,14 @@ void JsonBody(FILE* out, JsonBlock& parent, const AdData& ad, const ProcessResul
         JsonKeyString(out, o, "error", inLine.error);
         JsonExtensions(out, o, inLine.extensions);
         JsonKeyU64(out, o, "creativeCount", inLine.creativeCount);
-        JsonCreatives(out, o, inLine.creatives);
+        JsonCreatives(out, o, inLine.creatives, result);
     } else {
         const AdWrapper& wrapper = *static_cast<const AdWrapper*>(ad.body);
         JsonKeyString(out, o, "adSystem", wrapper.adSystem);
         JsonKeyString(out, o, "vastAdTagUri", wrapper.vastAdTagUri);
         JsonKeyString(out, o, "error", wrapper.error);
         JsonImpressions(out, o, wrapper.impressions);
-        JsonCreatives(out, o, wrapper.creatives);
+        JsonCreatives(out, o, wrapper.creatives, result);
         JsonExtensions(out, o, wrapper.extensions);
         // A nested parser is shown by the container it lends through the table.
         o.Key("nestedParser");
@@ -530,8 +527,12 @@ void JsonBody(FILE* out, JsonBlock& parent, const AdData& ad, const ProcessResul
                    result.nestedVast(wrapper.nestedParser, &nested) != KA_OK || nested == nullptr) {
             fputs("\"not shown\"", out);
         } else {
-            JsonVast(out, nested, o.Inner(), result, nesting + 1);
+            JsonVast(out, nested, o.Inner(), Nested(result, wrapper), nesting + 1);
         }
+    }
+    if (result.extrasApi != nullptr) {
+        const KaAdExtras* extras = AdExtrasOf(result, ad);
+        JsonAdExtras(out, o, extras);
     }
     o.End();
 }

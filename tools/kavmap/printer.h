@@ -22,6 +22,11 @@ struct ProcessResult {
     // The chain outcomes, printed after the records when trace is set (--trace).
     const KaChainOutcome* outcomes;
     bool trace;
+    // With a table here (--extras), each ad body and creative also shows its extras, looked
+    // up on handle; null: the records alone, as without the option.
+    const VMAPParserExtAPI* extrasApi;
+    void* handle;
+    bool nestedOwner;  // handle is a wrapper's nestedParser: the GetNested* slots apply
 };
 
 // Nested parsers are shown down to this many levels below the document; the library stops
