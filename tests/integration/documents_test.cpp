@@ -33,6 +33,11 @@
 
 #include "api_support.h"
 #include "ka/chain_limits.h"
+#include "loopback.h"
+
+// The HTTP server's headers bring <arpa/nameser.h>, whose p_type macro hides the ELF field read
+// below.
+#undef p_type
 #include "printer.h"
 
 namespace {
@@ -217,6 +222,27 @@ std::vector<std::string> Cycle(std::initializer_list<const std::vector<char>*> i
     }
     EXPECT_EQ(api.Close(handle), KA_OK);
     return printed;
+}
+
+// A chain of the extras read over HTTP, merged and not: relative references resolve against the
+// URL each document came from, and the records are those read from the files.
+TEST(DocumentsOverHttp, ChainOfExtrasReadsAsFromFiles) {
+    loopback::Server server;
+    ASSERT_TRUE(server.Running());
+    for (const char* mode : {"vast-extras/", "vast-no-merge-extras/"}) {
+        SCOPED_TRACE(mode);
+        for (const char* name :
+             {"chain_extras_middle.wrapped.xml", "chain_extras_inline.wrapped.xml"}) {
+            const std::vector<char> body = katest::ReadFile(kRoot + mode + name);
+            server.Put(name, std::string(body.begin(), body.end()));
+        }
+        const std::vector<char> top = katest::ReadFile(kRoot + mode + "chain_extras.xml");
+        const std::vector<char> expected = katest::ReadFile(kRoot + mode + "chain_extras.out");
+        const bool merge = std::string(mode).find("no-merge") == std::string::npos;
+        EXPECT_EQ(Cycle({&top}, true, merge, true, server.Url("/d/chain_extras.xml"))[0],
+                  std::string(expected.begin(), expected.end()));
+    }
+    EXPECT_EQ(server.Requests(), 4);
 }
 
 class Documents : public ::testing::TestWithParam<Case> {};
