@@ -27,20 +27,6 @@ void CVASTParser::CopyUrlList(const KaUrl* list, ka::Tail<KaUrl>& end) {
     }
 }
 
-void CVASTParser::CopyExtraTracking(const AdTracking* list, ka::Tail<AdTracking>& end,
-                                    uint32_t& count) {
-    for (; list != nullptr; list = list->next) {
-        if (!TakeCopy(sizeof(AdTracking) + ka::CopySize(list->event), list->url)) break;
-        AdTracking* copy = mArena->New<AdTracking>();
-        end.Add(copy);
-        ++count;
-        copy->event = mArena->CopyString(list->event);
-        copy->offsetKind = list->offsetKind;
-        copy->offset = list->offset;
-        copy->url = mArena->CopyString(list->url);
-    }
-}
-
 void CVASTParser::CopyVerifications(const KaVerification* list, ka::Tail<KaVerification>& end) {
     for (; list != nullptr; list = list->next) {
         if (!TakeCopy(sizeof(KaVerification) + ka::CopySize(list->vendor),
@@ -69,9 +55,8 @@ void CVASTParser::CopyVerifications(const KaVerification* list, ka::Tail<KaVerif
                 c->url = mArena->CopyString(r->url);
             }
         }
-        ka::Tail<AdTracking> events;
-        events.Start(&copy->trackingEvents);
-        CopyExtraTracking(list->trackingEvents, events, copy->trackingCount);
+        ka::ListEnd<AdTracking> events = ka::FindEnd(&copy->trackingEvents);
+        CopyTrackingList(list->trackingEvents, events, copy->trackingCount);
     }
 }
 
@@ -103,22 +88,20 @@ void CVASTParser::MergeExtras(const AdWrapper* wrapper, const AdInLine* inLine) 
             if (source->companionAds != nullptr && target->companionAds != nullptr) {
                 for (KaCompanion* to = target->companionAds->companions; to != nullptr;
                      to = to->next) {
-                    ka::Tail<AdTracking> events;
-                    events.Start(&to->trackingEvents);
+                    ka::ListEnd<AdTracking> events = ka::FindEnd(&to->trackingEvents);
                     ka::Tail<KaUrl> clicks;
                     clicks.Start(&to->clickTrackings);
                     for (const KaCompanion* f = source->companionAds->companions; f != nullptr;
                          f = f->next) {
-                        CopyExtraTracking(f->trackingEvents, events, to->trackingCount);
+                        CopyTrackingList(f->trackingEvents, events, to->trackingCount);
                         CopyUrlList(f->clickTrackings, clicks);
                     }
                 }
             }
             if (source->nonLinearAds != nullptr && target->nonLinearAds != nullptr) {
                 KaNonLinearAds* to = target->nonLinearAds;
-                ka::Tail<AdTracking> events;
-                events.Start(&to->trackingEvents);
-                CopyExtraTracking(source->nonLinearAds->trackingEvents, events, to->trackingCount);
+                ka::ListEnd<AdTracking> events = ka::FindEnd(&to->trackingEvents);
+                CopyTrackingList(source->nonLinearAds->trackingEvents, events, to->trackingCount);
                 for (KaNonLinear* n = to->nonLinears; n != nullptr; n = n->next) {
                     ka::Tail<KaUrl> clicks;
                     clicks.Start(&n->clickTrackings);

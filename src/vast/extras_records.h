@@ -7,22 +7,9 @@
 
 #include "ka/vast_extras.h"
 #include "platform/arena.h"
+#include "xml/record_lists.h"
 
 namespace ka {
-
-// The end of a list being filled: each node appended in O(1).
-template <typename T>
-struct Tail {
-    T** at = nullptr;
-    void Start(T** head) {
-        at = head;
-        while (*at != nullptr) at = &(*at)->next;
-    }
-    void Add(T* node) {
-        *at = node;
-        at = &node->next;
-    }
-};
 
 // The extras of a body or creative; null when it has none (or key is null).
 const KaAdExtras* FindAdExtras(const Arena& arena, const void* body);

@@ -193,7 +193,6 @@ private:
     void AppendUrl(void* node, ka::Tail<KaUrl>& list);
     // Copies of the extras lists for the merge, charged to the budget like the others.
     void CopyUrlList(const KaUrl* list, ka::Tail<KaUrl>& end);
-    void CopyExtraTracking(const AdTracking* list, ka::Tail<AdTracking>& end, uint32_t& count);
     void CopyVerifications(const KaVerification* list, ka::Tail<KaVerification>& end);
 
     // Forgets the remembered list ends; called around every walk and by every release.

@@ -68,4 +68,19 @@ T* Link(ListEnd<T>& end, T* node, uint32_t& count) {
     return node;
 }
 
+// The end of a list being filled whose count is kept elsewhere or not at all: each node
+// appended in O(1).
+template <typename T>
+struct Tail {
+    T** at = nullptr;
+    void Start(T** head) {
+        at = head;
+        while (*at != nullptr) at = &(*at)->next;
+    }
+    void Add(T* node) {
+        *at = node;
+        at = &node->next;
+    }
+};
+
 }  // namespace ka
