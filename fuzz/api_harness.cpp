@@ -5,6 +5,7 @@
 #include <string>
 
 #include "ka/chain_limits.h"
+#include "ka/vmap_parser_ext.h"
 #include "no_network.h"
 #include "record_walk.h"
 
@@ -51,7 +52,13 @@ uint32_t ProcessAndWalk(const VMAPParserAPI& api, void* handle, const uint8_t* d
     // The table takes a mutable buffer it promises not to keep.
     const uint32_t result =
         api.Process(handle, const_cast<uint8_t*>(data), static_cast<uint32_t>(size));
-    const kawalk::Walk walk = kawalk::WalkHandle(api, handle);
+    static const VMAPParserExtAPI ext = [] {
+        VMAPParserExtAPI table = {};
+        table.size = sizeof(table);
+        if (kaGetVMAPParserExtAPI(&table) != 0) abort();
+        return table;
+    }();
+    const kawalk::Walk walk = kawalk::WalkHandle(api, handle, &ext);
     if (!walk.countsAgree) {
         fprintf(stderr, "fuzz: a record count disagrees with its list\n");
         abort();
@@ -71,6 +78,7 @@ uint32_t RunDocument(const uint8_t* data, size_t size, const RunOptions& options
     api.SetParam(handle, KA_PID_VMAP_DEADLINE_MS,
                  reinterpret_cast<void*>(static_cast<uintptr_t>(options.deadlineMs)));
     api.SetParam(handle, KA_PID_VMAP_BASE_URL, const_cast<char*>(options.baseUrl));
+    api.SetParam(handle, KA_PID_VMAP_LENIENT, options.lenient ? &gStop : nullptr);
     const uint32_t result = ProcessAndWalk(api, handle, data, size, options.vastOnly);
     // The same bytes once more in the other mode: switching modes must release exactly what
     // the first Process built.

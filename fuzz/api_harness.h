@@ -23,6 +23,7 @@ struct RunOptions {
     uint64_t fetchBytes = 0;        // KA_PID_VMAP_FETCH_BYTES; 0: the default
     uint32_t deadlineMs = 0;        // KA_PID_VMAP_DEADLINE_MS; 0: none
     const char* baseUrl = nullptr;  // KA_PID_VMAP_BASE_URL
+    bool lenient = false;           // KA_PID_VMAP_LENIENT
 };
 
 // One document through a fresh handle on the build's modules: Open, Process in the first mode,

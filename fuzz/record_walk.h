@@ -8,12 +8,16 @@
 #include <cstring>
 
 #include "ka/vmap_parser_api.h"
+#include "ka/vmap_parser_ext.h"
 
 namespace kawalk {
 
 // A summary that depends on every byte read, so the reads cannot be optimised away.
 struct Walk {
     const VMAPParserAPI* api = nullptr;
+    // The second table and the handle, for the extras of each ad and creative; may be null.
+    const VMAPParserExtAPI* ext = nullptr;
+    void* handle = nullptr;
     uint64_t sum = 0;
     uint64_t records = 0;
     uint64_t nestedDocuments = 0;  // wrapped documents reached through nested parsers
@@ -79,7 +83,88 @@ struct Walk {
             Text(creative->id);
             Text(creative->adId);
             if (creative->kind == AD_CREATIVE_LINEAR) Linear(creative->content);
+            CreativeExtras(creative);
         }
+    }
+
+    // Lists whose nodes hold a url (and maybe more strings read by the caller's lambda).
+    template <typename Record, typename Each>
+    void List(const Record* first, Each each) {
+        for (; first != nullptr; first = first->next) {
+            ++records;
+            each(*first);
+        }
+    }
+    void Urls(const KaUrl* list) {
+        List(list, [this](const KaUrl& u) { Text(u.id), Text(u.url); });
+    }
+    void Resources(const KaResource* list) {
+        List(list, [this](const KaResource& r) { Text(r.creativeType), Text(r.content); });
+    }
+    void Tracking(uint32_t count, const AdTracking* list) {
+        Check(count, Count(list));
+        List(list, [this](const AdTracking& t) { Text(t.event), Text(t.url); });
+    }
+
+    void AdExtras(const AdData* ad) {
+        const KaAdExtras* e = nullptr;
+        if (ext == nullptr || ext->GetAdExtras(handle, ad, &e) != 0 || e == nullptr) return;
+        Text(e->adType);
+        Text(e->adServingId);
+        List(e->categories, [this](const KaCategory& c) { Text(c.authority), Text(c.code); });
+        List(e->blockedAdCategories, [this](const KaCategory& c) { Text(c.code); });
+        if (e->pricing != nullptr) Text(e->pricing->value);
+        Urls(e->viewable);
+        Urls(e->notViewable);
+        Urls(e->viewUndetermined);
+        List(e->verifications, [this](const KaVerification& v) {
+            Text(v.vendor);
+            Text(v.verificationParameters);
+            for (const KaVerificationResource* r : {v.javaScriptResources, v.executableResources})
+                List(r, [this](const KaVerificationResource& x) { Text(x.type), Text(x.url); });
+            Tracking(v.trackingCount, v.trackingEvents);
+        });
+    }
+
+    void CreativeExtras(const AdCreative* creative) {
+        const KaCreativeExtras* e = nullptr;
+        if (ext == nullptr || ext->GetCreativeExtras(handle, creative, &e) != 0 || e == nullptr)
+            return;
+        List(e->universalAdIds, [this](const KaUniversalAdId& u) { Text(u.value); });
+        Text(e->apiFramework);
+        Text(e->legacyAdId);
+        List(e->icons, [this](const KaIcon& i) {
+            Text(i.program), Text(i.clickThrough), Resources(i.resources);
+            Urls(i.clickTrackings), Urls(i.viewTrackings);
+            List(i.fallbackImages, [this](const KaFallbackImage& f) { Text(f.url); });
+        });
+        for (const KaMediaAsset* list : {e->mezzanines, e->interactiveFiles, e->closedCaptionFiles})
+            List(list, [this](const KaMediaAsset& a) { Text(a.type), Text(a.url); });
+        List(e->mediaFiles, [this](const KaMediaFileExtras& m) { Text(m.mediaType); });
+        if (const KaNonLinearAds* n = e->nonLinearAds) {
+            Tracking(n->trackingCount, n->trackingEvents);
+            List(n->nonLinears, [this](const KaNonLinear& x) {
+                Text(x.id), Text(x.adParameters), Resources(x.resources), Urls(x.clickTrackings);
+            });
+        }
+        if (const KaCompanionAds* c = e->companionAds) {
+            Text(c->required);
+            List(c->companions, [this](const KaCompanion& x) {
+                Text(x.adSlotId), Text(x.altText), Resources(x.resources), Urls(x.clickTrackings);
+                Tracking(x.trackingCount, x.trackingEvents);
+            });
+        }
+    }
+
+    // Each ad's chain outcome; the ad it names must be a live record.
+    void Outcomes() {
+        KaChainOutcome* o = nullptr;
+        if (ext == nullptr || ext->GetChainOutcomes(handle, &o) != 0) return;
+        List(o, [this](const KaChainOutcome& x) {
+            Text(x.ad->id);
+            for (uint32_t i = 0; i < x.hopCount; ++i) Text(x.hops[i].url), Text(x.hops[i].finalUrl);
+            for (uint32_t i = 0; i < x.errorUrlCount; ++i) Text(x.errorUrls[i]);
+        });
     }
 
     void Impressions(const AdImpression* impression) {
@@ -97,6 +182,7 @@ struct Walk {
         for (const AdData* ad = data->firstAd; ad != nullptr; ad = ad->next) {
             ++records;
             Text(ad->id);
+            AdExtras(ad);
             if (ad->body == nullptr) continue;
             if (ad->type == AD_TYPE_INLINE) {
                 const AdInLine* in = static_cast<const AdInLine*>(ad->body);
@@ -148,10 +234,14 @@ struct Walk {
     }
 };
 
-// Everything a handle lends after a Process: its AdInfo, its VAST container and content URI.
-inline Walk WalkHandle(const VMAPParserAPI& api, void* handle) {
+// Everything a handle lends after a Process: its AdInfo, its VAST container and content URI,
+// and through the second table (when given) the extras and the chain outcomes.
+inline Walk WalkHandle(const VMAPParserAPI& api, void* handle,
+                       const VMAPParserExtAPI* ext = nullptr) {
     Walk walk;
     walk.api = &api;
+    walk.ext = ext;
+    walk.handle = handle;
     AdInfo* info = nullptr;
     api.GetAdInfo(handle, &info);
     walk.Vmap(info);
@@ -161,6 +251,7 @@ inline Walk WalkHandle(const VMAPParserAPI& api, void* handle) {
     char* contentUri = nullptr;
     api.GetParam(handle, KA_PID_VMAP_CONTENT_URI, &contentUri);
     walk.Text(contentUri);
+    walk.Outcomes();
     return walk;
 }
 
