@@ -39,7 +39,7 @@ public:
     // A copy of the first length characters of text, terminated; throws std::bad_alloc.
     char* CopyText(const char* text, size_t length) {
         char* copy = AllocateText(length);
-        memcpy(copy, text, length);
+        CopyBytes(copy, text, length);
         copy[length] = '\0';
         return copy;
     }
@@ -83,6 +83,28 @@ public:
     static constexpr size_t kKeptBytes = kArenaKeptBytes;
 
 private:
+    // memcpy for the short names and values most copies are, without a call: two overlapping
+    // words cover 4 to 16 bytes.
+    static void CopyBytes(char* to, const char* from, size_t length) {
+        if (length > 16) {
+            memcpy(to, from, length);
+        } else if (length >= 8) {
+            uint64_t head, tail;
+            memcpy(&head, from, 8);
+            memcpy(&tail, from + length - 8, 8);
+            memcpy(to, &head, 8);
+            memcpy(to + length - 8, &tail, 8);
+        } else if (length >= 4) {
+            uint32_t head, tail;
+            memcpy(&head, from, 4);
+            memcpy(&tail, from + length - 4, 4);
+            memcpy(to, &head, 4);
+            memcpy(to + length - 4, &tail, 4);
+        } else {
+            for (size_t i = 0; i < length; ++i) to[i] = from[i];
+        }
+    }
+
     // The header of a chunk or own block; its memory follows, aligned to kAlignment.
     struct alignas(kAlignment) Block {
         Block* next;

@@ -12,8 +12,8 @@ constexpr char kModuleName[] = "kaXMLParser";
 constexpr char kModuleExtension[] = ".so";
 constexpr char kEntryName[] = "kaXMLGetParserAPI";
 
-// Handlers that read at most this many attributes look each one up by name.
-constexpr size_t kLookedUpNames = 2;
+// Handlers that read at most this many attributes look it up by name.
+constexpr size_t kLookedUpNames = 1;
 
 template <typename Word>
 Word Load(const char* at) {
@@ -121,11 +121,12 @@ bool CXMLDocument::ReadElementText(void* node, char*& field, TextForm form) {
     char* text = nullptr;
     int length = 0;
     GetTagValue(node, &text, length);
-    // The module's strings are NUL-terminated and its length says the same; neither the test for
-    // text nor the copy depends on that length.
     if (text == nullptr || text[0] == '\0') return false;
 
-    const size_t size = strlen(text);
+    // The module measures its texts as it loads them and terminates them: a length that ends on
+    // the terminator is taken, any other is measured again.
+    const size_t size =
+        length > 0 && text[length] == '\0' ? static_cast<size_t>(length) : strlen(text);
     const bool isCData = ka::IsCDataSection(text);
     size_t begin = 0;
     size_t count = size;
@@ -179,8 +180,9 @@ void CXMLDocument::ReadAttributeList(void* node, const XMLAttributeName* names,
                                      const uint32_t* byLength, XMLAttributeValue* values,
                                      size_t count) {
     const auto nextAttribute = mXMLAPI.GetNextAttribute;
-    // Two names cost two lookups, no more calls than a pass over an element that has one of
-    // them, and no comparisons here.
+    // One name costs one lookup. From two names on, a pass costs no more calls than the
+    // lookups (an element mostly has one of the two) and spares the module a strlen and a
+    // memcmp per lookup.
     if (count > kLookedUpNames && mXMLHandle != nullptr && nextAttribute != nullptr) {
         // Which names have been met: the first attribute of a name is the one read, and the
         // walk ends once every name has been met.

@@ -92,8 +92,8 @@ public:
     bool CopyAttribute(const XMLAttributeValue& value, char*& field);
     // Reads the attributes of node named in names in one pass over the element's attributes:
     // values[i] (empty when given) becomes the first attribute called names[i], as
-    // GetAttributeValue would find it. One or two names, and every name for a module that does
-    // not walk attributes, are looked up one by one instead.
+    // GetAttributeValue would find it. A single name, and every name for a module that does not
+    // walk attributes, are looked up one by one instead.
     template <size_t N>
     void ReadAttributes(void* node, const XMLAttributeNames<N>& names,
                         XMLAttributeValue (&values)[N]) {
@@ -111,18 +111,28 @@ protected:
     // length) for each direct child element with a non-empty name, in document order.
     template <class Parser, class Handler>
     void ForEachChild(void* node, void* target, Parser* parser, Handler handler) {
+        // Handlers never close or switch the module while its document is walked: the handle
+        // and the three accessors are read once per walk.
+        void* const handle = mXMLHandle;
+        const auto firstChild = mXMLAPI.GetFirstChild;
+        const auto nextSibling = mXMLAPI.GetNextSibling;
+        const auto tagName = mXMLAPI.GetTagName;
+        if (handle == nullptr || firstChild == nullptr || nextSibling == nullptr ||
+            tagName == nullptr) {
+            return;
+        }
         void* child = nullptr;
-        GetFirstChild(node, &child);
+        firstChild(handle, node, &child);
         while (child != nullptr) {
             char* name = nullptr;
             int length = 0;
-            GetTagName(child, &name, length);
+            tagName(handle, child, &name, &length);
             if (name != nullptr && length >= 1) {
                 (parser->*handler)(child, target, name, static_cast<unsigned int>(length));
             }
             // Written fresh each time: a lookup that fails without writing still ends the walk.
             void* sibling = nullptr;
-            GetNextSibling(child, &sibling);
+            nextSibling(handle, child, &sibling);
             child = sibling;
         }
     }
