@@ -155,28 +155,37 @@ void* realloc(void* pointer, size_t size) {
 #endif
 
 // Called from the library through its PLT, so the return address is the library's own code.
-void* operator new(size_t size) {
+// Never inlined: a memory checker that replaces the allocator by symbol (Valgrind) must see
+// every new and every delete, or it pairs its own new with this file's delete.
+__attribute__((noinline)) void* operator new(size_t size) {
     if (void* p = New(size, __builtin_return_address(0))) return p;
     throw std::bad_alloc();
 }
-void* operator new[](size_t size) {
+__attribute__((noinline)) void* operator new[](size_t size) {
     if (void* p = New(size, __builtin_return_address(0))) return p;
     throw std::bad_alloc();
 }
-void* operator new(size_t size, const std::nothrow_t&) noexcept {
+__attribute__((noinline)) void* operator new(size_t size, const std::nothrow_t&) noexcept {
     return New(size, __builtin_return_address(0));
 }
-void* operator new[](size_t size, const std::nothrow_t&) noexcept {
+__attribute__((noinline)) void* operator new[](size_t size, const std::nothrow_t&) noexcept {
     return New(size, __builtin_return_address(0));
 }
-void operator delete(void* p) noexcept { Free(p); }
-void operator delete[](void* p) noexcept { Free(p); }
-void operator delete(void* p, size_t) noexcept { Free(p); }
-void operator delete[](void* p, size_t) noexcept { Free(p); }
-void operator delete(void* p, const std::nothrow_t&) noexcept { Free(p); }
-void operator delete[](void* p, const std::nothrow_t&) noexcept { Free(p); }
+__attribute__((noinline)) void operator delete(void* p) noexcept { Free(p); }
+__attribute__((noinline)) void operator delete[](void* p) noexcept { Free(p); }
+__attribute__((noinline)) void operator delete(void* p, size_t) noexcept { Free(p); }
+__attribute__((noinline)) void operator delete[](void* p, size_t) noexcept { Free(p); }
+__attribute__((noinline)) void operator delete(void* p, const std::nothrow_t&) noexcept { Free(p); }
+__attribute__((noinline)) void operator delete[](void* p, const std::nothrow_t&) noexcept { Free(p); }
 
 namespace {
+
+// Valgrind puts its own allocator in place of the one above, in part: the blocks counted here
+// then say nothing, and no failure can be injected.
+bool UnderValgrind() {
+    const char* preload = getenv("LD_PRELOAD");
+    return preload != nullptr && strstr(preload, "vgpreload") != nullptr;
+}
 
 // The result code and the records of one Process, as text.
 std::string Print(void* handle, uint32_t result, bool vastOnly, bool extras) {
@@ -269,7 +278,10 @@ TEST_P(Documents, ReadIntoTheExpectedRecords) {
         EXPECT_EQ(p[2], p[0]) << "a second Process built other records";
         printed = p[0];
     }
-    EXPECT_EQ(gLiveBlocks, blocksBefore) << "Close left memory behind";
+    // Valgrind counts what is left behind itself; the blocks counted here are not all its.
+    if (!UnderValgrind()) {
+        EXPECT_EQ(gLiveBlocks, blocksBefore) << "Close left memory behind";
+    }
     katest::AllowLocalFiles(false);
 
     const std::string expectedPath = folder + c.name + ".out";
@@ -318,6 +330,7 @@ void PrintTo(const Injected& c, std::ostream* out) {
 class AllocationFailure : public ::testing::TestWithParam<Injected> {};
 
 TEST_P(AllocationFailure, EndsInAResultCodeAndLeavesTheHandleUsable) {
+    if (UnderValgrind()) GTEST_SKIP() << "the allocator is Valgrind's: nothing can be injected";
     const Injected& c = GetParam();
     const std::string path = kRoot + c.document;
     katest::AllowLocalFilesBelow(path.substr(0, path.rfind('/') + 1));
