@@ -89,20 +89,21 @@ private:
         if (length > 16) {
             memcpy(to, from, length);
         } else if (length >= 8) {
-            uint64_t head, tail;
-            memcpy(&head, from, 8);
-            memcpy(&tail, from + length - 8, 8);
-            memcpy(to, &head, 8);
-            memcpy(to + length - 8, &tail, 8);
+            CopyEnds<uint64_t>(to, from, length);
         } else if (length >= 4) {
-            uint32_t head, tail;
-            memcpy(&head, from, 4);
-            memcpy(&tail, from + length - 4, 4);
-            memcpy(to, &head, 4);
-            memcpy(to + length - 4, &tail, 4);
+            CopyEnds<uint32_t>(to, from, length);
         } else {
             for (size_t i = 0; i < length; ++i) to[i] = from[i];
         }
+    }
+    // The first and the last Word of length bytes (at least one Word), overlapping.
+    template <typename Word>
+    static void CopyEnds(char* to, const char* from, size_t length) {
+        Word head, tail;
+        memcpy(&head, from, sizeof(Word));
+        memcpy(&tail, from + length - sizeof(Word), sizeof(Word));
+        memcpy(to, &head, sizeof(Word));
+        memcpy(to + length - sizeof(Word), &tail, sizeof(Word));
     }
 
     // The header of a chunk or own block; its memory follows, aligned to kAlignment.
