@@ -29,7 +29,7 @@ unsigned int CVASTParser::LoadAdAttributes(void* node, AdData* ad) {
     XMLAttributeValue values[3];
     ReadAttributes(node, kNames, values);
     CopyAttribute(values[0], ad->id);
-    if (values[1].Present()) ad->sequence = ka::Atoi(values[1].value);
+    if (values[1].Present()) ad->sequence = ka::Atoi(values[1].value, values[1].length);
     mPendingAdType = nullptr;
     if (mReadExtras) CopyAttribute(values[2], mPendingAdType);
     return KA_OK;

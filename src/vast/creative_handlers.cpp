@@ -26,7 +26,7 @@ unsigned int CVASTParser::LoadCreativeAttributes(void* node, AdCreative* creativ
     XMLAttributeValue values[5];
     ReadAttributes(node, kNames, values);
     CopyAttribute(values[0], creative->id);
-    if (values[1].Present()) creative->sequence = ka::Atoi(values[1].value);
+    if (values[1].Present()) creative->sequence = ka::Atoi(values[1].value, values[1].length);
     CopyAttribute(values[2], creative->adId);
     LoadCreativeExtraAttributes(values[3], values[4]);
     return KA_OK;

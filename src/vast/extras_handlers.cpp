@@ -22,7 +22,7 @@ int32_t Flag(const XMLAttributeValue& value) {
 }
 
 void Number(const XMLAttributeValue& value, int32_t& field) {
-    if (value.Present()) field = ka::Atoi(value.value);
+    if (value.Present()) field = ka::Atoi(value.value, value.length);
 }
 
 int64_t Number64(const XMLAttributeValue& value) {

@@ -16,7 +16,7 @@ bool IsPercent(const char* value, int length) {
 
 // atoi of an attribute into field when the attribute is present.
 void ReadNumber(const XMLAttributeValue& attribute, int32_t& field) {
-    if (attribute.Present()) field = ka::Atoi(attribute.value);
+    if (attribute.Present()) field = ka::Atoi(attribute.value, attribute.length);
 }
 
 // A click element appended to one of the lists of an AdVideoClicks.

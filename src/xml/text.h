@@ -50,6 +50,18 @@ int ParseDecimal(const char* text);
 // What atoi gives, without the locale machinery of strtol: the number read as strtol reads it
 // into a long (clamped to the long range), then taken as an int (its low 32 bits).
 int Atoi(const char* text);
+// Atoi of a terminated text of the given length. Attribute numbers are mostly a few digits and
+// nothing else: those are read here directly, anything else goes to Atoi.
+inline int Atoi(const char* text, int length) {
+    if (length < 1 || length > 9) return Atoi(text);
+    int value = 0;
+    for (int i = 0; i < length; ++i) {
+        const unsigned int digit = static_cast<unsigned char>(text[i]) - static_cast<unsigned int>('0');
+        if (digit > 9) return Atoi(text);
+        value = value * 10 + static_cast<int>(digit);
+    }
+    return value;
+}
 
 // Copies the first length characters of text into out (room for length + 1), turning every
 // "&amp;" into "&" as unescape_amp does, and terminates it; the length written.

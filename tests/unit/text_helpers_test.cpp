@@ -36,6 +36,8 @@ TEST(TextHelpers, Cases) {
         } else if (f[0] == "atoi") {
             EXPECT_EQ(std::stoi(f[2]), ka::Atoi(f[1].c_str()));
             EXPECT_EQ(std::stoi(f[2]), atoi(f[1].c_str()));
+            // As an attribute's value, with its length.
+            EXPECT_EQ(std::stoi(f[2]), ka::Atoi(f[1].c_str(), static_cast<int>(f[1].size())));
         } else {
             EXPECT_EQ(
                 std::stoul(f[2]),
