@@ -80,12 +80,10 @@ RatioSpread InterleavedRatio(const bench::Document& document, int iterations) {
     bench::XmlModule module;
     std::vector<double> ratios;
     for (int round = 0; round < kRounds; ++round) {
-        const double process = CpuTimeOf(iterations, [&] {
-            benchmark::DoNotOptimize(handle.ProcessAll(document));
-        });
-        const double load = CpuTimeOf(iterations, [&] {
-            benchmark::DoNotOptimize(module.LoadAll(document));
-        });
+        const double process =
+            CpuTimeOf(iterations, [&] { benchmark::DoNotOptimize(handle.ProcessAll(document)); });
+        const double load =
+            CpuTimeOf(iterations, [&] { benchmark::DoNotOptimize(module.LoadAll(document)); });
         if (load > 0.0) ratios.push_back(process / load);
     }
     if (ratios.empty()) return {0.0, 0.0, 0.0};

@@ -189,16 +189,11 @@ int unescape_amp(char* text) {
 
 namespace {
 
-// The value of a decimal digit, or a number above 9 for any other character.
-unsigned int DigitValue(char c) {
-    return static_cast<unsigned int>(static_cast<unsigned char>(c)) - static_cast<unsigned int>('0');
-}
-
 // "dd" at text as a number; false, having read nothing past a non-digit, for anything else.
 bool TwoDigits(const char* text, unsigned int* value) {
-    const unsigned int high = DigitValue(text[0]);
+    const unsigned int high = ka::DigitValue(text[0]);
     if (high > 9) return false;
-    const unsigned int low = DigitValue(text[1]);
+    const unsigned int low = ka::DigitValue(text[1]);
     if (low > 9) return false;
     *value = high * 10 + low;
     return true;
@@ -217,8 +212,8 @@ unsigned int string2time(const char* text, int length) {
         const unsigned int whole = (hh * 3600u + mm * 60u + ss) * 1000u;
         if (text[8] != '.') return whole;
         // Milliseconds: exactly three digits here; any other form goes the general way.
-        if (TwoDigits(text + 9, &msHigh) && DigitValue(text[11]) <= 9) {
-            return whole + msHigh * 10u + DigitValue(text[11]);
+        if (TwoDigits(text + 9, &msHigh) && ka::DigitValue(text[11]) <= 9) {
+            return whole + msHigh * 10u + ka::DigitValue(text[11]);
         }
     }
     // sscanf(text, "%02d:%02d:%02d.%03d") without the cost of the format machinery: each field

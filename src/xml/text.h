@@ -47,6 +47,11 @@ bool ScanDecimal(const char** cursor, int width, long long* value);
 // atoi's reading (leading white space, a sign, digits up to the first other character, 0
 // without digits), clamped to the int range instead of overflowing.
 int ParseDecimal(const char* text);
+// The value of a decimal digit, or a number above 9 for any other character.
+inline unsigned int DigitValue(char c) {
+    return static_cast<unsigned int>(static_cast<unsigned char>(c)) -
+           static_cast<unsigned int>('0');
+}
 // What atoi gives, without the locale machinery of strtol: the number read as strtol reads it
 // into a long (clamped to the long range), then taken as an int (its low 32 bits).
 int Atoi(const char* text);
@@ -56,7 +61,7 @@ inline int Atoi(const char* text, int length) {
     if (length < 1 || length > 9) return Atoi(text);
     int value = 0;
     for (int i = 0; i < length; ++i) {
-        const unsigned int digit = static_cast<unsigned char>(text[i]) - static_cast<unsigned int>('0');
+        const unsigned int digit = DigitValue(text[i]);
         if (digit > 9) return Atoi(text);
         value = value * 10 + static_cast<int>(digit);
     }

@@ -176,7 +176,9 @@ __attribute__((noinline)) void operator delete[](void* p) noexcept { Free(p); }
 __attribute__((noinline)) void operator delete(void* p, size_t) noexcept { Free(p); }
 __attribute__((noinline)) void operator delete[](void* p, size_t) noexcept { Free(p); }
 __attribute__((noinline)) void operator delete(void* p, const std::nothrow_t&) noexcept { Free(p); }
-__attribute__((noinline)) void operator delete[](void* p, const std::nothrow_t&) noexcept { Free(p); }
+__attribute__((noinline)) void operator delete[](void* p, const std::nothrow_t&) noexcept {
+    Free(p);
+}
 
 namespace {
 
