@@ -73,11 +73,14 @@ void SetString(const char* value, int valueLength, char** text, int* length) {
     *length = valueLength;
 }
 
-// Names of one length often differ in their first character ("width", "codec"): that is
-// looked at before memcmp is called.
-bool SameName(const char* name, int nameLength, const char* wanted, size_t wantedLength) {
-    return static_cast<size_t>(nameLength) == wantedLength &&
-           (wantedLength == 0 || name[0] == wanted[0]) && memcmp(name, wanted, wantedLength) == 0;
+// Whether a name the index measured is the terminated string wanted, compared in place: names
+// mostly differ in their first bytes, so a lookup needs no strlen of what it looks for. A name
+// holds no NUL, so the comparison stops at wanted's terminator at the latest.
+bool IsNamed(const char* name, int nameLength, const char* wanted) {
+    for (int i = 0; i < nameLength; ++i) {
+        if (name[i] != wanted[i]) return false;
+    }
+    return wanted[nameLength] == '\0';
 }
 
 unsigned int Init(void** handle, XMLInitData* /*init*/) {
@@ -118,15 +121,19 @@ unsigned int LoadXML(void* handle, char* buffer, int size, int /*mode*/) {
 }
 
 unsigned int GetFirstChild(void* handle, void* node, void** child) {
-    ClearNode(child);
-    if (handle == nullptr || child == nullptr) return KA_ERR_NULL_ARGUMENT;
+    if (handle == nullptr || child == nullptr) {
+        ClearNode(child);
+        return KA_ERR_NULL_ARGUMENT;
+    }
     *child = AsNode(node == nullptr ? AsHandle(handle)->root : AsElement(node)->firstChild);
     return KA_OK;
 }
 
 unsigned int GetNextSibling(void* handle, void* node, void** sibling) {
-    ClearNode(sibling);
-    if (handle == nullptr || node == nullptr || sibling == nullptr) return KA_ERR_NULL_ARGUMENT;
+    if (handle == nullptr || node == nullptr || sibling == nullptr) {
+        ClearNode(sibling);
+        return KA_ERR_NULL_ARGUMENT;
+    }
     *sibling = AsNode(AsElement(node)->nextSibling);
     return KA_OK;
 }
@@ -136,9 +143,8 @@ unsigned int GetChildByName(void* handle, void* node, char* name, void** child) 
     if (handle == nullptr || node == nullptr || name == nullptr || child == nullptr) {
         return KA_ERR_NULL_ARGUMENT;
     }
-    const size_t wanted = strlen(name);
     for (const Element* it = AsElement(node)->firstChild; it != nullptr; it = it->nextSibling) {
-        if (SameName(it->name, it->nameLength, name, wanted)) {
+        if (IsNamed(it->name, it->nameLength, name)) {
             *child = AsNode(it);
             break;
         }
@@ -147,21 +153,21 @@ unsigned int GetChildByName(void* handle, void* node, char* name, void** child) 
 }
 
 unsigned int GetAttributeValue(void* handle, void* node, char* name, char** value, int* length) {
-    ClearString(value, length);
     if (handle == nullptr || node == nullptr || name == nullptr || value == nullptr ||
         length == nullptr) {
+        ClearString(value, length);
         return KA_ERR_NULL_ARGUMENT;
     }
     // Duplicate attributes are not refused; the first one is the one read.
     const Element* element = AsElement(node);
-    const size_t wanted = strlen(name);
     for (int i = 0; i < element->attributeCount; ++i) {
         const Attribute& attribute = element->attributes[i];
-        if (SameName(attribute.name, attribute.nameLength, name, wanted)) {
+        if (IsNamed(attribute.name, attribute.nameLength, name)) {
             SetString(attribute.value, attribute.valueLength, value, length);
-            break;
+            return KA_OK;
         }
     }
+    ClearString(value, length);
     return KA_OK;
 }
 
@@ -170,12 +176,15 @@ unsigned int GetAttributeValue(void* handle, void* node, char* name, char** valu
 // pointer is recognised without arithmetic on it: one below the first wraps to a large offset.
 const Attribute* AttributeAfter(const Element* element, const void* current) {
     const size_t count = static_cast<size_t>(element->attributeCount);
-    if (current == nullptr) return count > 0 ? element->attributes : nullptr;
+    if (count == 0) return nullptr;
+    if (current == nullptr) return element->attributes;
     const uintptr_t offset =
         reinterpret_cast<uintptr_t>(current) - reinterpret_cast<uintptr_t>(element->attributes);
-    if (offset % sizeof(Attribute) != 0) return nullptr;
-    const size_t index = offset / sizeof(Attribute) + 1;
-    return index < count ? element->attributes + index : nullptr;
+    // One of the attributes before the last, at its start: the next one follows it.
+    if (offset >= (count - 1) * sizeof(Attribute) || offset % sizeof(Attribute) != 0) {
+        return nullptr;
+    }
+    return element->attributes + offset / sizeof(Attribute) + 1;
 }
 
 // Walks an element's attributes in document order: a null current gives the first one, an
@@ -204,18 +213,18 @@ unsigned int GetNextAttribute(void* handle, void* node, void** next, void* curre
 }
 
 unsigned int GetTagValue(void* handle, void* node, char** text, int* length) {
-    ClearString(text, length);
     if (handle == nullptr || node == nullptr || text == nullptr || length == nullptr) {
+        ClearString(text, length);
         return KA_ERR_NULL_ARGUMENT;
     }
     const Element* element = AsElement(node);
-    if (element->text != nullptr) SetString(element->text, element->textLength, text, length);
+    SetString(element->text, element->text != nullptr ? element->textLength : 0, text, length);
     return KA_OK;
 }
 
 unsigned int GetTagName(void* handle, void* node, char** name, int* length) {
-    ClearString(name, length);
     if (handle == nullptr || node == nullptr || name == nullptr || length == nullptr) {
+        ClearString(name, length);
         return KA_ERR_NULL_ARGUMENT;
     }
     const Element* element = AsElement(node);
