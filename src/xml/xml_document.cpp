@@ -12,8 +12,10 @@ constexpr char kModuleName[] = "kaXMLParser";
 constexpr char kModuleExtension[] = ".so";
 constexpr char kEntryName[] = "kaXMLGetParserAPI";
 
-// Handlers that read at most this many attributes look it up by name.
-constexpr size_t kLookedUpNames = 1;
+// Handlers that read at most this many attributes look each one up by name: a pass over the
+// element's attributes takes a call per attribute and one more to end, which for a few names
+// costs more than their lookups.
+constexpr size_t kLookedUpNames = 4;
 
 template <typename Word>
 Word Load(const char* at) {
@@ -180,44 +182,51 @@ void CXMLDocument::ReadAttributeList(void* node, const XMLAttributeName* names,
                                      const uint32_t* byLength, XMLAttributeValue* values,
                                      size_t count) {
     const auto nextAttribute = mXMLAPI.GetNextAttribute;
-    // One name costs one lookup. From two names on, a pass costs no more calls than the
-    // lookups (an element mostly has one of the two) and spares the module a strlen and a
-    // memcmp per lookup.
-    if (count > kLookedUpNames && mXMLHandle != nullptr && nextAttribute != nullptr) {
+    void* const handle = mXMLHandle;
+    // Handlers that read many names (media files, companions, icons) meet most of them in one
+    // pass; a few names are looked up.
+    if (count > kLookedUpNames && handle != nullptr && nextAttribute != nullptr) {
         // Which names have been met: the first attribute of a name is the one read, and the
         // walk ends once every name has been met.
         const uint32_t all = count == 32 ? ~0u : (1u << count) - 1;
         uint32_t seen = 0;
         void* current = nullptr;
-        while (seen != all) {
+        // The module writes all four on every call that succeeds; one that left them would only
+        // show the last attribute again, whose name has been met.
+        char* name = nullptr;
+        char* value = nullptr;
+        int nameLength = 0;
+        int valueLength = 0;
+        do {
+            // Written fresh each time: a call that does not write it still ends the walk.
             void* next = nullptr;
-            char* name = nullptr;
-            char* value = nullptr;
-            int nameLength = 0;
-            int valueLength = 0;
-            const unsigned int result = nextAttribute(mXMLHandle, node, &next, current, &name,
+            const unsigned int result = nextAttribute(handle, node, &next, current, &name,
                                                       &nameLength, &value, &valueLength);
             if (result != KA_OK && current == nullptr) break;  // no walk: looked up by name
             if (result != KA_OK || next == nullptr) return;
             current = next;
-            if (name == nullptr || nameLength < 1 || nameLength >= kXMLAttributeNameLimit) continue;
-            // Only the names of this length, mostly one or none.
-            for (uint32_t candidates = byLength[nameLength]; candidates != 0;
+            if (name == nullptr || static_cast<unsigned int>(nameLength - 1) >=
+                                       static_cast<unsigned int>(kXMLAttributeNameLimit - 1)) {
+                continue;
+            }
+            // Only the names of this length not met yet, mostly one or none.
+            for (uint32_t candidates = byLength[nameLength] & ~seen; candidates != 0;
                  candidates &= candidates - 1) {
                 const int i = __builtin_ctz(candidates);
-                if (!SameBytes(names[i].name, name, nameLength)) continue;
-                if ((seen & (1u << i)) == 0) {
+                if (SameBytes(names[i].name, name, nameLength)) {
                     seen |= 1u << i;
                     values[i].value = value;
                     values[i].length = valueLength;
+                    break;
                 }
-                break;
             }
-        }
+        } while (seen != all);
         if (seen == all) return;
     }
+    const auto lookUp = mXMLAPI.GetAttributeValue;
+    if (handle == nullptr || lookUp == nullptr) return;
     for (size_t i = 0; i < count; ++i) {
-        GetAttributeValue(node, const_cast<char*>(names[i].name), &values[i].value,
-                          values[i].length);
+        // The module's lookups take mutable names but never write to them.
+        lookUp(handle, node, const_cast<char*>(names[i].name), &values[i].value, &values[i].length);
     }
 }

@@ -92,8 +92,8 @@ public:
     bool CopyAttribute(const XMLAttributeValue& value, char*& field);
     // Reads the attributes of node named in names in one pass over the element's attributes:
     // values[i] (empty when given) becomes the first attribute called names[i], as
-    // GetAttributeValue would find it. A single name, and every name for a module that does not
-    // walk attributes, are looked up one by one instead.
+    // GetAttributeValue would find it. A handful of names, and every name for a module that does
+    // not walk attributes, are looked up one by one instead.
     template <size_t N>
     void ReadAttributes(void* node, const XMLAttributeNames<N>& names,
                         XMLAttributeValue (&values)[N]) {
