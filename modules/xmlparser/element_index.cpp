@@ -145,7 +145,7 @@ bool ElementIndex::AddElement(pugi::xml_node node, Level& level) {
         const char* name = a.name();
         const char* value = a.value();
         mAttributes.push_back(Attribute{name, value, static_cast<int>(strlen(name)),
-                                        static_cast<int>(strlen(value)), nullptr});
+                                        static_cast<int>(strlen(value))});
     }
     if (mAttributes.empty()) return true;
     const size_t bytes = sizeof(Attribute) * mAttributes.size();

@@ -10,16 +10,12 @@
 
 namespace xmlmodule {
 
-// Padded to 32 bytes, so that GetNextAttribute places an attribute among its element's with a
-// mask instead of a division.
 struct Attribute {
     const char* name;
     const char* value;
     int nameLength;
     int valueLength;
-    const void* unused;
 };
-static_assert(sizeof(Attribute) == 32, "a power of two");
 
 struct Element {
     const char* name;
