@@ -21,6 +21,17 @@ CVASTParser::CVASTParser()
 
 CVASTParser::~CVASTParser() { CVASTParser::Close(); }
 
+void CVASTParser::Renew() {
+    Close();
+    ForgetVastAdData();
+    mMaxDepth = ka::kMaxWrapperDepth;
+    mMergeWrappers = 1;
+    mStopFlag = nullptr;
+    mFetchesLeft = KA_VMAP_FETCHES_PER_AD;
+    mBudget = nullptr;
+    ResetTails();
+}
+
 unsigned int CVASTParser::Open(char* workingPath) {
     SetWorkPath(workingPath);
     return InitXMLParser();

@@ -55,6 +55,10 @@ public:
     // parser, the parent's for a nested one. A parser made on its own uses an arena of its own,
     // freed with the parser.
     void UseArena(ka::Arena* arena) { mArena = arena; }
+    // Closes the parser and returns it to the state of a new one, its arena aside: the handle
+    // reads each VAST-only document with the parser of the one before, without a new and a
+    // delete per Process. The records of mVastAdData must have been released or handed on.
+    void Renew();
 
     // Calls handler for every child element of node that has a non-empty name; always 0.
     unsigned int LoadTag(void* node, void* target, TagHandler handler);

@@ -62,10 +62,10 @@ unsigned int CVMAPParser::Reset() {
     return KA_OK;
 }
 
-void CVMAPParser::ReleaseAll() {
+void CVMAPParser::ReleaseAll(bool keepVastParser) {
     mContentUri = nullptr;
     ReleaseAdInfo();
-    DestroyVASTParser();
+    if (!keepVastParser) DestroyVASTParser();
     mOutcomes = nullptr;
     mTrace.Clear();
     // Nothing points into the arena any more.
@@ -73,7 +73,10 @@ void CVMAPParser::ReleaseAll() {
 }
 
 unsigned int CVMAPParser::Process(void* buffer, unsigned int size) {
-    ReleaseAll();
+    // One VAST-only Process after another keeps the parser for CreateVASTParser to renew. A
+    // parser that a VMAP Process made is never kept: its container repeats records that the
+    // ad sources own.
+    ReleaseAll(mVastOnly == 1 && mBuiltVastOnly == 1);
     mBudget = ka::ChainBudget::Start(mFetchBytes, mDeadlineMs);
     const char* baseUrl = mBaseUrl.empty() ? nullptr : mBaseUrl.c_str();
     if (mVastOnly == 1) {
@@ -230,10 +233,13 @@ void CVMAPParser::ReleaseVastBlock(VastAdData* block) {
 }
 
 void CVMAPParser::CreateVASTParser() {
-    // Only ever called without a parser; one left over would keep its container's records
-    // with whoever copied them.
-    DestroyVASTParser();
-    mVastParser = new CVASTParser();
+    // The only parser that is ever left here is the last VAST-only Process's, whose records
+    // ReleaseAll has released: it is renewed instead of deleted and made again.
+    if (mVastParser != nullptr) {
+        mVastParser->Renew();
+    } else {
+        mVastParser = new CVASTParser();
+    }
     mVastParser->SetWorkPath(mWorkPath);
     mVastParser->UseArena(&mRecords);
     mVastParser->mReadExtras = mReadExtras;

@@ -99,8 +99,9 @@ private:
     Prefix mPrefixes[kMaxVmapPrefixes] = {};
     unsigned int mPrefixCount = 0;
 
-    // Everything Close does before unloading the module.
-    void ReleaseAll();
+    // Everything Close does before unloading the module; keepVastParser leaves the VAST
+    // parser, its records released, for the next VAST-only Process.
+    void ReleaseAll(bool keepVastParser = false);
     // Turns the trace of the Process that ends into the records GetChainOutcomes lends.
     void PublishOutcomes();
     void ReadContentUri(void* extensions);
