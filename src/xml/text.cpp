@@ -12,65 +12,6 @@ namespace {
 constexpr char kAmpEntity[] = "&amp;";
 constexpr size_t kAmpEntityLength = sizeof(kAmpEntity) - 1;
 
-// Copies the bytes from read on that come before the next '&' in whole blocks and words, and
-// says how many it copied: texts are mostly URLs of a few dozen bytes with one or two entities,
-// where a call per block costs more than the block. What it leaves starts at the '&', or is a
-// run of under eight bytes. Decoding only shrinks, so a block written never passes the end of
-// the copy while one is read.
-size_t CopyToAmp(char* write, const char* read, const char* end) {
-    const char* const start = read;
-#if __BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__
-    // Sixteen bytes at a time in the vector unit of every 64-bit target (SSE2, NEON): a byte
-    // equal to '&' turns into 0xff, and the lowest one set in either half is the first '&'.
-    typedef unsigned char Block __attribute__((vector_size(16)));
-    while (end - read >= 16) {
-        Block block;
-        memcpy(&block, read, sizeof(block));
-        memcpy(write, &block, sizeof(block));
-        const auto hits = block == '&';
-        uint64_t halves[2];
-        memcpy(halves, &hits, sizeof(halves));
-        if ((halves[0] | halves[1]) != 0) {
-            const size_t before = halves[0] != 0 ? __builtin_ctzll(halves[0]) / 8
-                                                 : 8 + __builtin_ctzll(halves[1]) / 8;
-            return static_cast<size_t>(read - start) + before;
-        }
-        read += 16;
-        write += 16;
-    }
-    // Then a word: the lowest byte flagged is the first '&', borrows only flag bytes above it.
-    constexpr uint64_t kOnes = 0x0101010101010101ull;
-    constexpr uint64_t kAmps = kOnes * '&';
-    if (end - read >= 8) {
-        uint64_t word;
-        memcpy(&word, read, sizeof(word));
-        memcpy(write, &word, sizeof(word));
-        const uint64_t x = word ^ kAmps;
-        const uint64_t amps = (x - kOnes) & ~x & (kOnes << 7);
-        if (amps != 0) return static_cast<size_t>(read - start) + __builtin_ctzll(amps) / 8;
-        read += 8;
-        write += 8;
-    }
-    // The last few bytes as the word that ends with them, when that word lies within this run:
-    // its first bytes were copied already and hold no '&', so rewriting them changes nothing
-    // and whatever is flagged is one of the last bytes.
-    const size_t left = static_cast<size_t>(end - read);
-    if (left > 0 && end - start >= 8) {
-        uint64_t word;
-        memcpy(&word, end - 8, sizeof(word));
-        memcpy(write + left - 8, &word, sizeof(word));
-        const uint64_t x = word ^ kAmps;
-        const uint64_t amps = (x - kOnes) & ~x & (kOnes << 7);
-        const size_t at = amps != 0 ? __builtin_ctzll(amps) / 8 : 8;
-        return static_cast<size_t>(read - start) + at - (8 - left);
-    }
-#else
-    (void)write;
-    (void)end;
-#endif
-    return static_cast<size_t>(read - start);
-}
-
 // Past this a decimal magnitude stops growing: it already clamps to either end of int.
 constexpr long long kDecimalCeiling = static_cast<long long>(INT_MAX) + 1;
 
@@ -161,19 +102,25 @@ int Atoi(const char* text) {
 }
 
 size_t CopyDecodingAmp(char* out, const char* text, size_t length) {
-    char* write = out;
-    const char* read = text;
-    const char* end = text + length;
-    for (;;) {
-        const size_t plain = CopyToAmp(write, read, end);
-        read += plain;
-        write += plain;
-        while (read < end && *read != '&') *write++ = *read++;
-        if (read == end) break;
+    // Copied whole, then decoded in place from the first '&': most texts hold none, and those
+    // that do mostly hold one or two near their end.
+    memcpy(out, text, length);
+    out[length] = '\0';
+    char* read = static_cast<char*>(memchr(out, '&', length));
+    if (read == nullptr) return length;
+    char* const end = out + length;
+    char* write = read;
+    while (read != end) {
+        // At an '&': it stays, the rest of an entity goes.
         *write++ = '&';
         const bool entity = static_cast<size_t>(end - read) >= kAmpEntityLength &&
                             memcmp(read, kAmpEntity, kAmpEntityLength) == 0;
         read += entity ? kAmpEntityLength : 1;
+        char* next = static_cast<char*>(memchr(read, '&', static_cast<size_t>(end - read)));
+        if (next == nullptr) next = end;
+        memmove(write, read, static_cast<size_t>(next - read));
+        write += next - read;
+        read = next;
     }
     *write = '\0';
     return static_cast<size_t>(write - out);
