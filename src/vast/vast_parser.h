@@ -55,9 +55,9 @@ public:
     // parser, the parent's for a nested one. A parser made on its own uses an arena of its own,
     // freed with the parser.
     void UseArena(ka::Arena* arena) { mArena = arena; }
-    // Closes the parser and returns it to the state of a new one, its arena aside: the handle
-    // reads each VAST-only document with the parser of the one before, without a new and a
-    // delete per Process. The records of mVastAdData must have been released or handed on.
+    // Closes the parser and returns it to the state of a new one, its arena aside, so that a
+    // handle reads each document with the parser of the one before instead of a new one. What
+    // mVastAdData held is forgotten: it must have been released or handed on.
     void Renew();
 
     // Calls handler for every child element of node that has a non-empty name; always 0.

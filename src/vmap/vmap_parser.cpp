@@ -43,6 +43,7 @@ CVMAPParser::CVMAPParser()
 
 CVMAPParser::~CVMAPParser() {
     ReleaseAll();
+    FreeSpareVASTParser();
     UninitXMLParser();
 }
 
@@ -53,6 +54,7 @@ unsigned int CVMAPParser::Open(char* workPath) {
 
 unsigned int CVMAPParser::Close() {
     ReleaseAll();
+    FreeSpareVASTParser();
     UninitXMLParser();
     return KA_OK;
 }
@@ -62,10 +64,10 @@ unsigned int CVMAPParser::Reset() {
     return KA_OK;
 }
 
-void CVMAPParser::ReleaseAll(bool keepVastParser) {
+void CVMAPParser::ReleaseAll() {
     mContentUri = nullptr;
     ReleaseAdInfo();
-    if (!keepVastParser) DestroyVASTParser();
+    DestroyVASTParser();
     mOutcomes = nullptr;
     mTrace.Clear();
     // Nothing points into the arena any more.
@@ -73,10 +75,7 @@ void CVMAPParser::ReleaseAll(bool keepVastParser) {
 }
 
 unsigned int CVMAPParser::Process(void* buffer, unsigned int size) {
-    // One VAST-only Process after another keeps the parser for CreateVASTParser to renew. A
-    // parser that a VMAP Process made is never kept: its container repeats records that the
-    // ad sources own.
-    ReleaseAll(mVastOnly == 1 && mBuiltVastOnly == 1);
+    ReleaseAll();
     mBudget = ka::ChainBudget::Start(mFetchBytes, mDeadlineMs);
     const char* baseUrl = mBaseUrl.empty() ? nullptr : mBaseUrl.c_str();
     if (mVastOnly == 1) {
@@ -233,9 +232,11 @@ void CVMAPParser::ReleaseVastBlock(VastAdData* block) {
 }
 
 void CVMAPParser::CreateVASTParser() {
-    // The only parser that is ever left here is the last VAST-only Process's, whose records
-    // ReleaseAll has released: it is renewed instead of deleted and made again.
-    if (mVastParser != nullptr) {
+    // Only ever called without a parser. The one the last Process destroyed is renewed when
+    // there is one: a Process then costs no new and no delete of it.
+    if (mSpareVastParser != nullptr) {
+        mVastParser = mSpareVastParser;
+        mSpareVastParser = nullptr;
         mVastParser->Renew();
     } else {
         mVastParser = new CVASTParser();
@@ -251,8 +252,15 @@ void CVMAPParser::CreateVASTParser() {
 void CVMAPParser::DestroyVASTParser() {
     if (mVastParser == nullptr) return;
     mVastParser->Close();
-    delete mVastParser;
+    // Out of reach of the player and of the release steps, kept for the next CreateVASTParser.
+    FreeSpareVASTParser();
+    mSpareVastParser = mVastParser;
     mVastParser = nullptr;
+}
+
+void CVMAPParser::FreeSpareVASTParser() {
+    delete mSpareVastParser;
+    mSpareVastParser = nullptr;
 }
 
 unsigned int CVMAPParser::LoadVASTAdData(void* node, VastAdData* block) {

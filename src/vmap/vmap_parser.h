@@ -55,7 +55,8 @@ public:
 
     // The owned VAST parser: created on the working path, building its records in this
     // handle's arena and reading through this handle's XML module (nothing is loaded per
-    // Process), and closed and destroyed. Destroying it does not release its container.
+    // Process), and closed and destroyed. Destroying it does not release its container; the
+    // object is set aside for the next one to reuse.
     void CreateVASTParser();
     void DestroyVASTParser();
     // Reads the VAST child of a vmap:VASTAdData / vmap:VASTData element into block, which then
@@ -99,9 +100,12 @@ private:
     Prefix mPrefixes[kMaxVmapPrefixes] = {};
     unsigned int mPrefixCount = 0;
 
-    // Everything Close does before unloading the module; keepVastParser leaves the VAST
-    // parser, its records released, for the next VAST-only Process.
-    void ReleaseAll(bool keepVastParser = false);
+    // Everything Close does before unloading the module, the spare VAST parser aside.
+    void ReleaseAll();
+    // The VAST parser that DestroyVASTParser set aside, closed, for CreateVASTParser to renew;
+    // null when there is none. Freed at Close.
+    CVASTParser* mSpareVastParser = nullptr;
+    void FreeSpareVASTParser();
     // Turns the trace of the Process that ends into the records GetChainOutcomes lends.
     void PublishOutcomes();
     void ReadContentUri(void* extensions);
