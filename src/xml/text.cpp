@@ -102,26 +102,20 @@ int Atoi(const char* text) {
 }
 
 size_t CopyDecodingAmp(char* out, const char* text, size_t length) {
-    // Copied whole, then decoded in place from the first '&': most texts hold none, and those
-    // that do mostly hold one or two near their end.
-    memcpy(out, text, length);
-    out[length] = '\0';
-    char* read = static_cast<char*>(memchr(out, '&', length));
-    if (read == nullptr) return length;
-    char* const end = out + length;
-    char* write = read;
-    while (read != end) {
-        // At an '&': it stays, the rest of an entity goes.
+    char* write = out;
+    const char* read = text;
+    const char* end = text + length;
+    // Between two '&' everything moves as one block; most texts hold none.
+    while (const char* amp = static_cast<const char*>(memchr(read, '&', end - read))) {
+        memcpy(write, read, amp - read);
+        write += amp - read;
         *write++ = '&';
-        const bool entity = static_cast<size_t>(end - read) >= kAmpEntityLength &&
-                            memcmp(read, kAmpEntity, kAmpEntityLength) == 0;
-        read += entity ? kAmpEntityLength : 1;
-        char* next = static_cast<char*>(memchr(read, '&', static_cast<size_t>(end - read)));
-        if (next == nullptr) next = end;
-        memmove(write, read, static_cast<size_t>(next - read));
-        write += next - read;
-        read = next;
+        const bool entity = static_cast<size_t>(end - amp) >= kAmpEntityLength &&
+                            memcmp(amp, kAmpEntity, kAmpEntityLength) == 0;
+        read = amp + (entity ? kAmpEntityLength : 1);
     }
+    memcpy(write, read, end - read);
+    write += end - read;
     *write = '\0';
     return static_cast<size_t>(write - out);
 }
