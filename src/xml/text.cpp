@@ -12,6 +12,71 @@ namespace {
 constexpr char kAmpEntity[] = "&amp;";
 constexpr size_t kAmpEntityLength = sizeof(kAmpEntity) - 1;
 
+#if __BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__
+// Flags the bytes of a little-endian word that are '&' (their top bit); the lowest byte flagged
+// is the first '&', as borrows only flag bytes above it.
+uint64_t AmpBytes(uint64_t word) {
+    constexpr uint64_t kOnes = 0x0101010101010101ull;
+    const uint64_t x = word ^ (kOnes * '&');
+    return (x - kOnes) & ~x & (kOnes << 7);
+}
+#endif
+
+// Copies the bytes from read on that come before the next '&' in whole blocks and words, and
+// says how many it copied: texts are mostly URLs of a few dozen bytes with one or two entities,
+// where a call per block costs more than the block. What it leaves starts at the '&', or is a
+// run of under eight bytes. Decoding only shrinks, so a block written never passes the end of
+// the copy while one is read.
+size_t CopyToAmp(char* write, const char* read, const char* end) {
+    const char* const start = read;
+#if __BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__
+    // Sixteen bytes at a time in the vector unit of every 64-bit target (SSE2, NEON): a byte
+    // equal to '&' turns into 0xff, and the lowest one set in either half is the first '&'.
+    typedef unsigned char Block __attribute__((vector_size(16)));
+    while (end - read >= 16) {
+        Block block;
+        memcpy(&block, read, sizeof(block));
+        memcpy(write, &block, sizeof(block));
+        const auto hits = block == '&';
+        uint64_t halves[2];
+        memcpy(halves, &hits, sizeof(halves));
+        if ((halves[0] | halves[1]) != 0) {
+            const size_t before = halves[0] != 0 ? __builtin_ctzll(halves[0]) / 8
+                                                 : 8 + __builtin_ctzll(halves[1]) / 8;
+            return static_cast<size_t>(read - start) + before;
+        }
+        read += 16;
+        write += 16;
+    }
+    // Then a word.
+    if (end - read >= 8) {
+        uint64_t word;
+        memcpy(&word, read, sizeof(word));
+        memcpy(write, &word, sizeof(word));
+        const uint64_t amps = AmpBytes(word);
+        if (amps != 0) return static_cast<size_t>(read - start) + __builtin_ctzll(amps) / 8;
+        read += 8;
+        write += 8;
+    }
+    // The last few bytes as the word that ends with them, when that word lies within this run:
+    // its first bytes were copied already and hold no '&', so rewriting them changes nothing
+    // and whatever is flagged is one of the last bytes.
+    const size_t left = static_cast<size_t>(end - read);
+    if (left > 0 && end - start >= 8) {
+        uint64_t word;
+        memcpy(&word, end - 8, sizeof(word));
+        memcpy(write + left - 8, &word, sizeof(word));
+        const uint64_t amps = AmpBytes(word);
+        const size_t at = amps != 0 ? __builtin_ctzll(amps) / 8 : 8;
+        return static_cast<size_t>(read - start) + at - (8 - left);
+    }
+#else
+    (void)write;
+    (void)end;
+#endif
+    return static_cast<size_t>(read - start);
+}
+
 // Past this a decimal magnitude stops growing: it already clamps to either end of int.
 constexpr long long kDecimalCeiling = static_cast<long long>(INT_MAX) + 1;
 
@@ -105,17 +170,17 @@ size_t CopyDecodingAmp(char* out, const char* text, size_t length) {
     char* write = out;
     const char* read = text;
     const char* end = text + length;
-    // Between two '&' everything moves as one block; most texts hold none.
-    while (const char* amp = static_cast<const char*>(memchr(read, '&', end - read))) {
-        memcpy(write, read, amp - read);
-        write += amp - read;
+    for (;;) {
+        const size_t plain = CopyToAmp(write, read, end);
+        read += plain;
+        write += plain;
+        while (read < end && *read != '&') *write++ = *read++;
+        if (read == end) break;
         *write++ = '&';
-        const bool entity = static_cast<size_t>(end - amp) >= kAmpEntityLength &&
-                            memcmp(amp, kAmpEntity, kAmpEntityLength) == 0;
-        read = amp + (entity ? kAmpEntityLength : 1);
+        const bool entity = static_cast<size_t>(end - read) >= kAmpEntityLength &&
+                            memcmp(read, kAmpEntity, kAmpEntityLength) == 0;
+        read += entity ? kAmpEntityLength : 1;
     }
-    memcpy(write, read, end - read);
-    write += end - read;
     *write = '\0';
     return static_cast<size_t>(write - out);
 }
