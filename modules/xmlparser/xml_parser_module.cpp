@@ -180,11 +180,11 @@ const Attribute* AttributeAfter(const Element* element, const void* current) {
     if (current == nullptr) return element->attributes;
     const uintptr_t offset =
         reinterpret_cast<uintptr_t>(current) - reinterpret_cast<uintptr_t>(element->attributes);
-    // One of the attributes before the last, at its start: the next one follows it. The
-    // division's remainder is checked by multiplying back.
-    const size_t index = offset / sizeof(Attribute);
-    if (index + 1 >= count || index * sizeof(Attribute) != offset) return nullptr;
-    return element->attributes + index + 1;
+    // One of the attributes before the last, at its start: the next one follows it. The answer
+    // is current's neighbour, so the library's next step waits on no division; only the check
+    // does.
+    if (offset >= (count - 1) * sizeof(Attribute) || offset % sizeof(Attribute) != 0) return nullptr;
+    return static_cast<const Attribute*>(current) + 1;
 }
 
 // Walks an element's attributes in document order: a null current gives the first one, an
