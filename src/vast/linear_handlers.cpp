@@ -117,15 +117,17 @@ unsigned int CVASTParser::LoadMediaFileAttributes(void* node, AdMediaFile* media
         }
     }
     CopyAttribute(values[1], mediaFile->type);
-    ReadNumber(values[2], mediaFile->width);
-    ReadNumber(values[3], mediaFile->height);
     CopyAttribute(values[4], mediaFile->codec);
-    ReadNumber(values[5], mediaFile->id);
-    ReadNumber(values[6], mediaFile->bitrate);
-    ReadNumber(values[7], mediaFile->minBitrate);
-    ReadNumber(values[8], mediaFile->maxBitrate);
-    ReadNumber(values[9], mediaFile->scalable);
-    ReadNumber(values[10], mediaFile->maintainAspectRatio);
+    // The numbers in one loop over a table instead of one inlined reading each: a media file
+    // runs this once per rendition, and a smaller walk leaves more of the cache to the load.
+    static constexpr struct {
+        uint8_t index;
+        int32_t AdMediaFile::*field;
+    } kNumbers[] = {{2, &AdMediaFile::width},       {3, &AdMediaFile::height},
+                    {5, &AdMediaFile::id},          {6, &AdMediaFile::bitrate},
+                    {7, &AdMediaFile::minBitrate},  {8, &AdMediaFile::maxBitrate},
+                    {9, &AdMediaFile::scalable},    {10, &AdMediaFile::maintainAspectRatio}};
+    for (const auto& number : kNumbers) ReadNumber(values[number.index], mediaFile->*number.field);
     LoadMediaFileExtras(mediaFile, values + 11);
     return KA_OK;
 }

@@ -129,7 +129,7 @@ bool CXMLDocument::ReadElementText(void* node, char*& field, TextForm form) {
     // the terminator is taken, any other is measured again.
     const size_t size =
         length > 0 && text[length] == '\0' ? static_cast<size_t>(length) : strlen(text);
-    const bool isCData = ka::IsCDataSection(text);
+    const bool isCData = ka::IsCDataSection(text, size);
     size_t begin = 0;
     size_t count = size;
     if (isCData) ka::CDataContent(text, size, &begin, &count);
@@ -144,10 +144,6 @@ bool CXMLDocument::ReadElementText(void* node, char*& field, TextForm form) {
         field = mArena->CopyText(text + begin, count);
     }
     return true;
-}
-
-void CXMLDocument::GetElementText(void* node, char*& field) {
-    ReadElementText(node, field, TextForm::kDecoded);
 }
 
 unsigned int CXMLDocument::IsElementCData(void* node, char** text, int& length) {

@@ -78,8 +78,11 @@ public:
     // at least one character of text; true when it did. A failed copy throws and leaves the
     // field as is.
     bool ReadElementText(void* node, char*& field, TextForm form);
-    // ReadElementText in the decoded form: what most record fields hold.
-    void GetElementText(void* node, char*& field);
+    // ReadElementText in the decoded form: what most record fields hold. A call, not a second
+    // copy of the reader in every handler.
+    void GetElementText(void* node, char*& field) {
+        ReadElementText(node, field, TextForm::kDecoded);
+    }
     // 0 when the element's text is a CDATA section, 0x91001000 otherwise.
     unsigned int IsElementCData(void* node, char** text, int& length);
 
