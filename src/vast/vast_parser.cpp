@@ -8,15 +8,9 @@
 #include "platform/limits.h"
 #include "vast/chain_trace.h"
 
-CVASTParser::CVASTParser()
-    : mVastAdData(),
-      mMaxDepth(ka::kMaxWrapperDepth),
-      mExtensionParser(nullptr),
-      mMergeWrappers(1),
-      mStopFlag(nullptr),
-      mFetchesLeft(KA_VMAP_FETCHES_PER_AD),
-      mBudget(nullptr) {
+CVASTParser::CVASTParser() : mVastAdData(), mExtensionParser(nullptr) {
     mArena = &mOwnArena;
+    ResetChainState();
 }
 
 CVASTParser::~CVASTParser() { CVASTParser::Close(); }
@@ -24,12 +18,16 @@ CVASTParser::~CVASTParser() { CVASTParser::Close(); }
 void CVASTParser::Renew() {
     Close();
     ForgetVastAdData();
+    ResetChainState();
+    ResetTails();
+}
+
+void CVASTParser::ResetChainState() {
     mMaxDepth = ka::kMaxWrapperDepth;
     mMergeWrappers = 1;
     mStopFlag = nullptr;
     mFetchesLeft = KA_VMAP_FETCHES_PER_AD;
     mBudget = nullptr;
-    ResetTails();
 }
 
 unsigned int CVASTParser::Open(char* workingPath) {

@@ -201,6 +201,8 @@ private:
 
     // Forgets the remembered list ends; called around every walk and by every release.
     void ResetTails();
+    // The wrapper depth, merge and stop flags, fetches left and budget of a new parser.
+    void ResetChainState();
 
     // The arena of a parser that was given none.
     ka::Arena mOwnArena;
