@@ -183,7 +183,9 @@ const Attribute* AttributeAfter(const Element* element, const void* current) {
     // One of the attributes before the last, at its start: the next one follows it. The answer
     // is current's neighbour, so the library's next step waits on no division; only the check
     // does.
-    if (offset >= (count - 1) * sizeof(Attribute) || offset % sizeof(Attribute) != 0) return nullptr;
+    if (offset >= (count - 1) * sizeof(Attribute) || offset % sizeof(Attribute) != 0) {
+        return nullptr;
+    }
     return static_cast<const Attribute*>(current) + 1;
 }
 

@@ -123,10 +123,10 @@ unsigned int CVASTParser::LoadMediaFileAttributes(void* node, AdMediaFile* media
     static constexpr struct {
         uint8_t index;
         int32_t AdMediaFile::*field;
-    } kNumbers[] = {{2, &AdMediaFile::width},       {3, &AdMediaFile::height},
-                    {5, &AdMediaFile::id},          {6, &AdMediaFile::bitrate},
-                    {7, &AdMediaFile::minBitrate},  {8, &AdMediaFile::maxBitrate},
-                    {9, &AdMediaFile::scalable},    {10, &AdMediaFile::maintainAspectRatio}};
+    } kNumbers[] = {{2, &AdMediaFile::width},      {3, &AdMediaFile::height},
+                    {5, &AdMediaFile::id},         {6, &AdMediaFile::bitrate},
+                    {7, &AdMediaFile::minBitrate}, {8, &AdMediaFile::maxBitrate},
+                    {9, &AdMediaFile::scalable},   {10, &AdMediaFile::maintainAspectRatio}};
     for (const auto& number : kNumbers) ReadNumber(values[number.index], mediaFile->*number.field);
     LoadMediaFileExtras(mediaFile, values + 11);
     return KA_OK;
