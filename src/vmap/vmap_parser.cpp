@@ -41,11 +41,7 @@ CVMAPParser::CVMAPParser()
     mArena = &mRecords;
 }
 
-CVMAPParser::~CVMAPParser() {
-    ReleaseAll();
-    FreeSpareVASTParser();
-    UninitXMLParser();
-}
+CVMAPParser::~CVMAPParser() { CVMAPParser::Close(); }
 
 unsigned int CVMAPParser::Open(char* workPath) {
     SetWorkPath(workPath);
